@@ -1,0 +1,236 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "utilities/Debug.h"
+
+#include "tests/support/LogCapture.h"
+#include "utilities/LogWriter.h"
+
+#include <QCoreApplication>
+#include <QElapsedTimer>
+#include <QTest>
+#include <QTimer>
+
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <thread>
+
+using TestSupport::LogCapture;
+using Utilities::Debug;
+
+class DebugTest : public QObject
+{
+    Q_OBJECT
+
+private slots:
+    void everyOperationHasItsPriority_data();
+    void everyOperationHasItsPriority();
+    void identityAndFacilityAreFixed();
+    void infoAndDebugBriefLogTheTextAlone();
+    void composedLineIsFileCommaLineCommaText();
+    void emptyFileGivesALineThatStartsWithAComma();
+    void negativeLineKeepsItsMinusSign();
+    void sourceNameIsThePathFromTheProjectRoot();
+    void conversionInATextIsExpandedByTheLogService();
+    void errnoConversionShowsTheCallersErrno();
+    void literalForeignTextReachesTheLogAsReceived();
+    void charactersBeyondLatin1AreLost();
+    void fatalLogsReturnsAndEndsTheEventLoopWithMinusOne();
+    void fatalFromAnotherThreadEndsTheEventLoop();
+    void fatalBeforeTheEventLoopEndsNothing();
+    void messagesFromManyThreadsAllArrive();
+    void messagesAfterCloseStillArriveUnderTheProgramsName();
+    void aServiceThatTakesNothingHoldsNobodyUp();
+};
+
+void DebugTest::everyOperationHasItsPriority_data()
+{
+    using Operation = void (*)();
+    QTest::addColumn<Operation>("operation");
+    QTest::addColumn<int>("priority");
+    QTest::addRow("info") << Operation([] { Debug::info("x"); }) << 6;
+    QTest::addRow("debugBrief") << Operation([] { Debug::debugBrief("x"); }) << 7;
+    QTest::addRow("debug") << Operation([] { Debug::debugMessage("f", 1, "x"); }) << 7;
+    QTest::addRow("warning") << Operation([] { Debug::warningMessage("f", 1, "x"); }) << 4;
+    QTest::addRow("critical") << Operation([] { Debug::criticalMessage("f", 1, "x"); }) << 2;
+    QTest::addRow("fatal") << Operation([] { Debug::fatalMessage("f", 1, "x"); }) << 0;
+}
+
+void DebugTest::everyOperationHasItsPriority()
+{
+    using Operation = void (*)();
+    QFETCH(const Operation, operation);
+    LogCapture log;
+    operation();
+    QVERIFY(log.waitFor("x"));
+    QTEST(log.lines().front().priority, "priority");
+}
+
+void DebugTest::identityAndFacilityAreFixed()
+{
+    LogCapture log;
+    Debug::info("x");
+    QVERIFY(log.waitFor("x"));
+    QCOMPARE(log.lines().front().identity, "VQK");
+    QCOMPARE(log.lines().front().facility, 1);
+}
+
+void DebugTest::infoAndDebugBriefLogTheTextAlone()
+{
+    LogCapture log;
+    Debug::info("Starting");
+    Debug::debugBrief("brief");
+    QVERIFY(log.waitFor("brief"));
+    QCOMPARE(log.texts(), (QStringList{"Starting", "brief"}));
+}
+
+void DebugTest::composedLineIsFileCommaLineCommaText()
+{
+    LogCapture log;
+    Debug::debugMessage("a/B.cpp", 1, "one");
+    Debug::warningMessage("a/B.cpp", 419, "Reading when no data available");
+    Debug::criticalMessage("a/B.cpp", 3, "three");
+    Debug::fatalMessage("a/B.cpp", 4, "four");
+    QVERIFY(log.waitFor("four"));
+    QCOMPARE(log.texts(), (QStringList{"a/B.cpp, 1, one", "a/B.cpp, 419, Reading when no data available",
+                                       "a/B.cpp, 3, three", "a/B.cpp, 4, four"}));
+}
+
+void DebugTest::emptyFileGivesALineThatStartsWithAComma()
+{
+    LogCapture log;
+    Debug::warningMessage(QString(), 7, "x");
+    QVERIFY(log.waitFor("x"));
+    QCOMPARE(log.texts().front(), ", 7, x");
+}
+
+void DebugTest::negativeLineKeepsItsMinusSign()
+{
+    LogCapture log;
+    Debug::warningMessage("f", -12, "x");
+    QVERIFY(log.waitFor("x"));
+    QCOMPARE(log.texts().front(), "f, -12, x");
+}
+
+void DebugTest::sourceNameIsThePathFromTheProjectRoot()
+{
+    QCOMPARE(QString(__FILE__), "tests/utilities/DebugTest.cpp");
+}
+
+void DebugTest::conversionInATextIsExpandedByTheLogService()
+{
+    LogCapture log;
+    Debug::info("100%% sure");
+    QVERIFY(log.waitFor("sure"));
+    QCOMPARE(log.texts().front(), "100% sure");
+}
+
+void DebugTest::errnoConversionShowsTheCallersErrno()
+{
+    LogCapture log;
+    errno = ENODEV;
+    Debug::warningMessage("f", 1, "%m");
+    QVERIFY(log.waitFor("No such device"));
+}
+
+void DebugTest::literalForeignTextReachesTheLogAsReceived()
+{
+    LogCapture log;
+    Debug::warningMessage("f", 1, "noise " + Debug::literal("%n%s") + " end");
+    QVERIFY(log.waitFor("noise %n%s end"));
+}
+
+void DebugTest::charactersBeyondLatin1AreLost()
+{
+    LogCapture log;
+    Debug::info(QStringLiteral("a\u00e9\u20ac.z"));
+    QVERIFY(log.waitFor(".z"));
+    QCOMPARE(log.texts().front(), QStringLiteral("a\u00e9?.z"));
+}
+
+void DebugTest::fatalLogsReturnsAndEndsTheEventLoopWithMinusOne()
+{
+    LogCapture log;
+    bool callerWentOn = false;
+    QTimer::singleShot(0, this, [&] {
+        Debug::fatalMessage("f", 1, "fatal");
+        callerWentOn = log.waitFor("fatal");
+    });
+    QCOMPARE(QCoreApplication::exec(), -1);
+    QVERIFY(callerWentOn);
+}
+
+void DebugTest::fatalFromAnotherThreadEndsTheEventLoop()
+{
+    LogCapture log;
+    std::thread worker;
+    QTimer::singleShot(0, this, [&] { worker = std::thread([] { Debug::fatalMessage("f", 1, "fatal"); }); });
+    QCOMPARE(QCoreApplication::exec(), -1);
+    worker.join();
+}
+
+void DebugTest::fatalBeforeTheEventLoopEndsNothing()
+{
+    LogCapture log;
+    Debug::fatalMessage("f", 1, "too early");
+    QTimer::singleShot(0, this, [] { QCoreApplication::exit(5); });
+    QCOMPARE(QCoreApplication::exec(), 5);
+}
+
+void DebugTest::messagesFromManyThreadsAllArrive()
+{
+    constexpr int threadCount = 8;
+    constexpr int messagesEach = 200;
+    LogCapture log;
+    std::vector<std::thread> threads;
+    for (int index = 0; index < threadCount; ++index)
+        threads.emplace_back([] {
+            for (int message = 0; message < messagesEach; ++message)
+                Debug::warningMessage("f", message, "concurrent");
+        });
+    for (auto& thread : threads)
+        thread.join();
+    QVERIFY(log.waitFor("concurrent", threadCount * messagesEach));
+}
+
+void DebugTest::messagesAfterCloseStillArriveUnderTheProgramsName()
+{
+    LogCapture log;
+    Debug::close();
+    Debug::info("late");
+    QVERIFY(log.waitFor("late"));
+    QCOMPARE(log.lines().front().identity, "DebugTest");
+}
+
+void DebugTest::aServiceThatTakesNothingHoldsNobodyUp()
+{
+    // A service that nobody reads: its queue fills after a few hundred messages at the most.
+    const int stuck = ::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0);
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    std::strcpy(address.sun_path, "/dev/log");
+    QCOMPARE(::bind(stuck, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
+    Debug::open();
+
+    constexpr int far = 5 * static_cast<int>(Utilities::LogWriter::capacity);
+    for (int message = 0; message < far; ++message)
+        Debug::info("nobody reads this");
+
+    // Reached at all: no call above blocked. The service comes back and the queue drains.
+    ::close(stuck);
+    ::unlink("/dev/log");
+    LogCapture log;
+    QVERIFY(QTest::qWaitFor(
+        [&] {
+            Debug::info("back again");
+            return log.count("back again") > 0;
+        },
+        20000));
+}
+
+QTEST_GUILESS_MAIN(DebugTest)
+#include "DebugTest.moc"

@@ -1,0 +1,3 @@
+# SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+# SPDX-License-Identifier: MIT
+immunityrig_test(DebugTest SOURCES utilities/DebugTest.cpp LIBRARIES Utilities LABELS unit)

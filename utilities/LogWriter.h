@@ -1,0 +1,65 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#pragma once
+
+#include <QByteArray>
+
+#include <chrono>
+#include <condition_variable>
+#include <cstdint>
+#include <deque>
+#include <functional>
+#include <mutex>
+#include <thread>
+
+namespace Utilities
+{
+
+/// Carries log messages to `syslog` on a thread of its own, so that a log service which takes nothing blocks that
+/// thread and nobody else.
+///
+/// Threads: every operation may be called from any thread. Each waits until its request has been carried out, but all
+/// callers together wait at most `patience` for a service that hangs; until the service moves again nobody waits.
+/// The queue holds `capacity` requests; a request that finds it full is dropped.
+/// At the end of the process the writer waits `patience` for what is still queued. A service that hangs even then is
+/// left behind with its thread: the exit of the process ends both.
+class LogWriter
+{
+public:
+    static constexpr std::size_t capacity = 1000;
+    static constexpr std::chrono::milliseconds patience{250};
+
+    static LogWriter& instance();
+
+    LogWriter(const LogWriter&) = delete;
+    LogWriter& operator=(const LogWriter&) = delete;
+
+    /// `identity` must outlive the writer: `openlog` keeps the pointer.
+    void open(const char* identity, int options, int facility);
+    void close();
+    /// `format` is the format of the `syslog` call; `%m` shows the caller's `errno`.
+    void write(int priority, const QByteArray& format);
+
+private:
+    using Request = std::function<void()>;
+
+    LogWriter();
+    ~LogWriter() = default;
+
+    void submit(Request request);
+    void run();
+    void finish();
+    [[nodiscard]] bool waitFor(std::unique_lock<std::mutex>& lock, std::uint64_t ticket);
+
+    std::mutex mutex;
+    std::condition_variable changed;
+    std::deque<Request> queue;
+    std::uint64_t submitted = 0;
+    std::uint64_t completed = 0;
+    bool hanging = false;
+    bool finishing = false;
+    std::thread thread;
+};
+
+} // namespace Utilities
