@@ -6,6 +6,7 @@
 #include "utilities/LogWriter.h"
 
 #include <QCoreApplication>
+#include <QIODevice>
 #include <QTextStream>
 
 #include <syslog.h>

@@ -49,7 +49,7 @@ private:
 LogWriter& LogWriter::instance()
 {
     // Never destroyed: objects with static storage duration may still log while the process ends.
-    static LogWriter* const writer = new LogWriter;
+    static auto* const writer = new LogWriter;
     return *writer;
 }
 

@@ -59,8 +59,8 @@ Registry::Registry(QObject* parent) : QObject(parent)
 const ControlSpec* Registry::find(const QString& name)
 {
     const auto table = controlTable();
-    const auto found = std::find_if(table.begin(), table.end(),
-                                    [&](const ControlSpec& spec) { return fromView(spec.name) == name; });
+    const auto found =
+        std::find_if(table.begin(), table.end(), [&](const ControlSpec& spec) { return fromView(spec.name) == name; });
     return found == table.end() ? nullptr : &*found;
 }
 
