@@ -1,0 +1,76 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "presentation/TerminationSignals.h"
+
+#include <QCoreApplication>
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <cerrno>
+#include <csignal>
+
+namespace Presentation
+{
+
+namespace
+{
+
+std::atomic<int> pipeInput{-1};
+static_assert(std::atomic<int>::is_always_lock_free, "the signal handler reads it");
+
+void setAction(void (*handler)(int))
+{
+    struct sigaction action
+    {
+    };
+    action.sa_handler = handler;
+    action.sa_flags = SA_RESTART;
+    sigemptyset(&action.sa_mask);
+    sigaction(SIGTERM, &action, nullptr);
+    sigaction(SIGINT, &action, nullptr);
+}
+
+/// Calls nothing but what a signal handler may call.
+void requestEnd(int /*signal*/)
+{
+    const int savedErrno = errno;
+    setAction(SIG_DFL);
+    const char byte = 1;
+    [[maybe_unused]] const auto written = ::write(pipeInput.load(), &byte, 1);
+    errno = savedErrno;
+}
+
+} // namespace
+
+TerminationSignals::Pipe::Pipe()
+{
+    if (::pipe2(ends, O_CLOEXEC | O_NONBLOCK) != 0)
+        qWarning("Termination signals end the program at once: no pipe");
+}
+
+TerminationSignals::Pipe::~Pipe()
+{
+    ::close(ends[0]);
+    ::close(ends[1]);
+}
+
+TerminationSignals::TerminationSignals() : notifier(pipe.ends[0], QSocketNotifier::Read)
+{
+    connect(&notifier, &QSocketNotifier::activated, this, [this] {
+        notifier.setEnabled(false);
+        QCoreApplication::quit();
+    });
+    pipeInput = pipe.ends[1];
+    setAction(requestEnd);
+}
+
+TerminationSignals::~TerminationSignals()
+{
+    setAction(SIG_DFL);
+    pipeInput = -1;
+}
+
+} // namespace Presentation

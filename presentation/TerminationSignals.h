@@ -1,0 +1,41 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#pragma once
+
+#include <QObject>
+#include <QSocketNotifier>
+
+namespace Presentation
+{
+
+/// Ends the event loop on SIGTERM and SIGINT, so that everything is destroyed in its order; the second of them ends
+/// the process at once. The handlers only write to a pipe, whose other end the event loop watches: a signal that comes
+/// before the loop runs ends it as soon as it does.
+///
+/// Lives in the GUI thread, one at a time; the signals get their default action back when it is destroyed.
+class TerminationSignals : public QObject
+{
+    Q_OBJECT
+
+public:
+    TerminationSignals();
+    ~TerminationSignals() override;
+
+private:
+    class Pipe
+    {
+    public:
+        Pipe();
+        ~Pipe();
+        Pipe(const Pipe&) = delete;
+        Pipe& operator=(const Pipe&) = delete;
+
+        int ends[2] = {-1, -1};
+    };
+
+    Pipe pipe;
+    QSocketNotifier notifier;
+};
+
+} // namespace Presentation

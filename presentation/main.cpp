@@ -1,0 +1,48 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "presentation/TerminationSignals.h"
+#include "presentation/TestGui.h"
+#include "utilities/Debug.h"
+
+#include <QApplication>
+
+#include <csignal>
+
+namespace
+{
+
+/// What must stand before the application object is made.
+void prepareProcess()
+{
+    // Nobody reading standard error any more must not end the run.
+    std::signal(SIGPIPE, SIG_IGN);
+    // The device's Qt configuration moves the prefix to /usr/share, where there are no plugins: the ones of the Qt that
+    // the program was built with serve.
+    QCoreApplication::addLibraryPath(QStringLiteral(IMMUNITYRIG_QT_PLUGINS));
+    // The framebuffer plugin would stretch the window to the screen; the layout is made of pixels and stays as it is.
+    qputenv("QT_QPA_FB_FORCE_FULLSCREEN", "0");
+}
+
+void run(int argc, char** argv)
+{
+    QApplication application(argc, argv);
+    // A closed window does not end the run: the log's fatal messages and the termination signals do.
+    QApplication::setQuitOnLastWindowClosed(false);
+    const Presentation::TerminationSignals terminationSignals;
+    Presentation::TestGui testGui;
+    testGui.show();
+    QApplication::exec();
+    Utilities::Debug::close();
+}
+
+} // namespace
+
+int main(int argc, char** argv)
+{
+    Utilities::Debug::open();
+    prepareProcess();
+    Utilities::Debug::info(QStringLiteral("Starting ImmunityRig"));
+    run(argc, argv);
+    return 0;
+}
