@@ -1,0 +1,3 @@
+# SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+# SPDX-License-Identifier: MIT
+immunityrig_test(BeaconRecordsTest SOURCES Domain/BeaconRecordsTest.cpp LIBRARIES Domain LABELS unit)
