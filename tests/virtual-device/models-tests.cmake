@@ -1,0 +1,5 @@
+# SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+# SPDX-License-Identifier: MIT
+immunityrig_test(RadioFrameTest SOURCES virtual-device/RadioFrameTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(LineDamageTest SOURCES virtual-device/LineDamageTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(RadioModelTest SOURCES virtual-device/RadioModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
