@@ -11,10 +11,64 @@ namespace VirtualDevice
 namespace
 {
 
+/// What every file of the tree can be made to answer: ENOENT takes the entry away, EACCES refuses to open it, the
+/// others fail the reading, writing or asking.
+constexpr std::string_view fileFaults = "none|EIO|ENODATA|ENOENT|EACCES";
+/// A link can also stay behind when what it names has gone.
+constexpr std::string_view linkFaults = "none|dangling|EIO|ENODATA|ENOENT|EACCES";
+/// What a file holds instead of its value.
+constexpr std::string_view contents = "normal|empty|binary|huge|no-newline";
+
+constexpr std::int64_t lowest32 = -2'147'483'648;
+constexpr std::int64_t highest32 = 2'147'483'647;
+constexpr std::int64_t endOf2099 = 4'102'444'799;
+constexpr std::int64_t plenty = 1'000'000'000'000;
+constexpr std::int64_t hour = 3'600'000; ///< in ms
+
 constexpr std::array controls{
-    integerControl("battery.voltage", "uV", -2'147'483'648, 2'147'483'647, "4100000", "what the fuel gauge measures"),
-    integerControl("battery.current", "uA", -2'147'483'648, 2'147'483'647, "-123456",
+    // Fuel gauge
+    integerControl("battery.voltage", "uV", lowest32, highest32, "4100000", "what the fuel gauge measures"),
+    integerControl("battery.current", "uA", lowest32, highest32, "-123456",
                    "what the fuel gauge measures; negative while the battery discharges"),
+    choiceControl("battery.voltage_content", contents, "normal", "what the voltage file holds in place of the value"),
+    choiceControl("battery.current_content", contents, "normal", "what the current file holds in place of the value"),
+    choiceControl("battery.voltage_fault", fileFaults, "none", "how the voltage file fails"),
+    choiceControl("battery.current_fault", fileFaults, "none", "how the current file fails"),
+
+    // Real-time clock
+    integerControl("rtc.time", "s", 0, endOf2099, "0",
+                   "seconds since 1970-01-01 UTC; the clock runs on from what is set, and starts at the host's time"),
+    switchControl("rtc.running", "on", "off stops the clock"),
+    choiceControl("rtc.fault", "none|EIO|ENODATA|EINVAL|ENOENT|EACCES|garbage", "none",
+                  "how reading the clock fails; garbage answers with nonsense, ENOENT and EACCES refuse to open it"),
+
+    // USB
+    switchControl("usb.hid", "on", "a HID device is plugged in at 1-1.4"),
+    choiceControl("usb.hid_fault", linkFaults, "none", "how the entry of the HID device fails"),
+    switchControl("usb.gadget", "on", "a host is connected: the controller is a peripheral"),
+    choiceControl("usb.gadget_content", contents, "normal", "what the mode file holds in place of the mode"),
+    choiceControl("usb.gadget_fault", fileFaults, "none", "how the mode file fails"),
+
+    // SD card
+    switchControl("sd.present", "on", "the card's block device exists; its mounted partition stays either way"),
+    choiceControl("sd.block_fault", linkFaults, "none", "how the entry of the card's block device fails"),
+    switchControl("sd.readonly", "off", "the data partition refuses every change"),
+    switchControl("sd.full", "off", "the data partition has no room left"),
+    choiceControl("sd.fault", fileFaults, "none", "how everything on the data partition fails"),
+
+    // Signal lines
+    integerControl("trigger.period", "ms", 0, hour, "0", "a trigger (F10) arrives this often; 0 = never"),
+    integerControl("radioline.period", "ms", 0, hour, "0", "the radio line (F11) is raised this often; 0 = never"),
+    reported(integerControl("led.power_latch", "", 0, 255, "0", "the power latch; the program never clears it")),
+    reported(integerControl("led.writes", "", 0, plenty, "0", "how often the power latch was written")),
+    reported(textControl("led.written", 64, "", "when the power latch was last written")),
+    choiceControl("led.fault", fileFaults, "none", "how the power latch's file fails"),
+    reported(integerControl("reset_line.writes", "", 0, plenty, "0", "how often the radio's reset line was pulsed")),
+    reported(textControl("reset_line.written", 64, "", "when the radio's reset line was last pulsed")),
+    choiceControl("reset_line.fault", fileFaults, "none", "how the reset line's file fails"),
+
+    // System log
+    switchControl("log.stalled", "off", "the log service stops reading, so that its queue fills"),
 
     // The radio microcontroller on the serial line.
     choiceControl("radio.presence", "present|missing", "present",

@@ -1,0 +1,64 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "virtual-device/commands/Commands.h"
+#include "virtual-device/commands/DeviceSession.h"
+
+#include <QCommandLineParser>
+#include <QCoreApplication>
+#include <QDir>
+#include <QFileInfo>
+#include <QTextStream>
+
+namespace VirtualDevice
+{
+
+namespace
+{
+
+QString builtProgram()
+{
+    return QDir(QCoreApplication::applicationDirPath()).absoluteFilePath(QStringLiteral("../presentation/immunityrig"));
+}
+
+/// The program and its folder, which the sandbox must see at the same place.
+std::optional<QString> chooseProgram(const QCommandLineParser& parser, DeviceOptions& options)
+{
+    const QFileInfo program(parser.isSet("program") ? parser.value("program") : builtProgram());
+    if (!program.isFile() || !program.isExecutable())
+        return QStringLiteral("%1 is no program: build it, or name one with --program").arg(program.filePath());
+    options.command = {program.canonicalFilePath()};
+    options.readOnlyFolders = {QFileInfo(program.canonicalFilePath()).path()};
+    return std::nullopt;
+}
+
+void announce(const Device& device)
+{
+    QTextStream(stdout) << "ready: VNC " << device.vncAddress() << ", control " << device.controlSocket() << Qt::endl;
+}
+
+} // namespace
+
+int runCommand(const QStringList& arguments)
+{
+    QCommandLineParser parser;
+    parser.setApplicationDescription("Runs the program on a virtual device until it ends or is interrupted.");
+    DeviceSession::addOptions(parser);
+    parser.addOptions({{"vnc-port", "Offer the screen on this port of 127.0.0.1 instead of a free one.", "port"},
+                       {"program", "Run this program instead of the one of this build.", "file"}});
+    DeviceOptions options;
+    if (const auto status = DeviceSession::parse(parser, arguments, options))
+        return *status;
+    bool isPort = true;
+    if (parser.isSet("vnc-port"))
+        options.vncPort = parser.value("vnc-port").toUShort(&isPort);
+    if (!isPort || !parser.positionalArguments().isEmpty())
+        return DeviceSession::complain("wrong use: see virtual-device run --help", ExitStatus::wrongUse);
+    if (const auto problem = chooseProgram(parser, options))
+        return DeviceSession::complain(*problem, ExitStatus::failure);
+    DeviceSession session(options);
+    QObject::connect(&session.device(), &Device::ready, [&] { announce(session.device()); });
+    return session.run();
+}
+
+} // namespace VirtualDevice

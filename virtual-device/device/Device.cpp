@@ -1,0 +1,168 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "virtual-device/device/Device.h"
+
+#include "virtual-device/sandbox/StateFolder.h"
+
+#include <QDir>
+#include <QFileInfo>
+#include <QLocalSocket>
+#include <QTimer>
+
+namespace VirtualDevice
+{
+
+namespace
+{
+
+using Kind = SandboxBind::Kind;
+
+/// Where the sandbox sees the folder of sockets that it shares with us.
+const QString sharedFolder = QStringLiteral("/run/virtual-device");
+const QString stalledControl = QStringLiteral("log.stalled");
+
+} // namespace
+
+Device::Device(DeviceOptions choices, QObject* parent)
+    : QObject(parent), options(std::move(choices)), deviceTree(values), dataPartition(values)
+{
+    connect(&values, &Registry::changed, &logStore, [this](const QString& name, const QJsonValue& value) {
+        if (name == stalledControl)
+            logStore.setStalled(value.toBool());
+    });
+    connect(&sandbox, &Sandbox::ended, this, [this](int status) {
+        tearDown();
+        emit ended(status);
+    });
+}
+
+Device::~Device()
+{
+    tearDown();
+}
+
+std::optional<QString> Device::start()
+{
+    DeviceFolder::cleanUp();
+    auto problem = deviceFolder.claim(options.name);
+    if (!problem)
+        problem = makeFiles();
+    if (!problem)
+        problem = startSandbox();
+    if (problem)
+        tearDown();
+    return problem;
+}
+
+std::optional<QString> Device::makeFiles()
+{
+    if (auto problem = prepareState(stateFolder()))
+        return problem;
+    for (const char* name : {"tree", "card", "shared"})
+        QDir().mkpath(deviceFolder.path(QString::fromLatin1(name)));
+    if (auto problem = deviceTree.mount(deviceFolder.path(QStringLiteral("tree"))))
+        return problem;
+    const QString card = deviceFolder.path(QStringLiteral("card"));
+    if (auto problem = dataPartition.mount(stateFolder() + QStringLiteral("/mnt/data"), card))
+        return problem;
+    return logStore.open(deviceFolder.path(QStringLiteral("log")));
+}
+
+std::optional<QString> Device::startSandbox()
+{
+    if (options.isOwnCommand)
+        return sandbox.start(plan(), Sandbox::Streams::Inherited);
+    if (auto problem = relay.listen(options.vncPort, vncSocket()))
+        return problem;
+    auto problem = sandbox.start(plan(), Sandbox::Streams::Captured);
+    if (!problem)
+        watchForWindow();
+    return problem;
+}
+
+SandboxPlan Device::plan() const
+{
+    const QString state = stateFolder();
+    SandboxPlan plan;
+    plan.command = options.command;
+    plan.add(deviceFolder.path(QStringLiteral("tree/sys")), QStringLiteral("/sys"), Kind::Writable);
+    plan.add(deviceFolder.path(QStringLiteral("tree/rtc")), QStringLiteral("/dev/rtc"), Kind::Writable);
+    plan.add(deviceFolder.path(QStringLiteral("log")), QStringLiteral("/dev/log"), Kind::Writable);
+    plan.add(state + QStringLiteral("/mnt"), QStringLiteral("/mnt"), Kind::Writable);
+    plan.add(deviceFolder.path(QStringLiteral("card")), QStringLiteral("/mnt/data"), Kind::Writable);
+    plan.add(state + QStringLiteral("/etc/sounds"), QStringLiteral("/etc/sounds"), Kind::Writable);
+    plan.binds.append({state + QStringLiteral("/dsp.out"), QStringLiteral("/dsp.out"), Kind::ReadOnly, true});
+    for (const auto& folder : options.readOnlyFolders)
+        plan.add(folder, folder, Kind::ReadOnly);
+    if (options.isOwnCommand)
+        addOwnCommand(plan);
+    else
+        addScreen(plan);
+    return plan;
+}
+
+void Device::addScreen(SandboxPlan& plan) const
+{
+    plan.add(deviceFolder.path(QStringLiteral("shared")), sharedFolder, Kind::Writable);
+    plan.vncSocket = sharedFolder + QStringLiteral("/vnc");
+    plan.environment.insert(QStringLiteral("QT_QPA_PLATFORM"), QStringLiteral("vnc:size=240x320"));
+}
+
+void Device::addOwnCommand(SandboxPlan& plan) const
+{
+    plan.inheritsEnvironment = true;
+    if (!qEnvironmentVariableIsSet("QT_QPA_PLATFORM"))
+        plan.environment.insert(QStringLiteral("QT_QPA_PLATFORM"), QStringLiteral("offscreen"));
+    const QString control = QStringLiteral("/run/control");
+    plan.environment.insert(QStringLiteral("VIRTUAL_DEVICE_CONTROL"), control);
+    plan.binds.append({controlSocket(), control, Kind::Writable, true});
+}
+
+/// The program's server greets whoever connects, once it has made its screen; until then the relay hangs up.
+void Device::watchForWindow()
+{
+    constexpr int pause = 50; // ms
+    auto* greeting = new QLocalSocket(&sandbox);
+    connect(greeting, &QLocalSocket::readyRead, this, [this, greeting] {
+        greeting->disconnect(this);
+        greeting->deleteLater();
+        emit ready();
+    });
+    const auto again = [this, greeting] {
+        greeting->deleteLater();
+        if (sandbox.isRunning())
+            QTimer::singleShot(pause, this, &Device::watchForWindow);
+    };
+    connect(greeting, &QLocalSocket::disconnected, this, again);
+    connect(greeting, &QLocalSocket::errorOccurred, this, again);
+    greeting->connectToServer(vncSocket());
+}
+
+/// In the opposite order: nobody may use a file system when it goes.
+void Device::tearDown()
+{
+    sandbox.kill();
+    logStore.close();
+    dataPartition.unmount();
+    deviceTree.unmount();
+    deviceFolder.release();
+}
+
+QString Device::vncSocket() const
+{
+    return deviceFolder.path(QStringLiteral("shared/vnc"));
+}
+
+QString Device::controlSocket() const
+{
+    return DeviceFolder::controlSocket(deviceFolder.name());
+}
+
+QString Device::stateFolder() const
+{
+    return options.stateFolder.isEmpty() ? deviceFolder.path(QStringLiteral("state"))
+                                         : QFileInfo(options.stateFolder).absoluteFilePath();
+}
+
+} // namespace VirtualDevice

@@ -1,0 +1,87 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#pragma once
+
+#include "virtual-device/log/LogStore.h"
+#include "virtual-device/registry/Registry.h"
+#include "virtual-device/sandbox/DeviceFolder.h"
+#include "virtual-device/sandbox/Sandbox.h"
+#include "virtual-device/sandbox/VncRelay.h"
+#include "virtual-device/tree/DataPartition.h"
+#include "virtual-device/tree/DeviceTree.h"
+
+#include <QObject>
+#include <QString>
+#include <QStringList>
+
+#include <optional>
+
+namespace VirtualDevice
+{
+
+struct DeviceOptions
+{
+    QString name;        ///< empty: the first free "device-N"
+    QString stateFolder; ///< kept after the end; empty: one that goes with the device
+    quint16 vncPort = 0; ///< on 127.0.0.1; 0: one that is free
+    QStringList command; ///< what runs in the sandbox
+    /// A person's own command has the caller's terminal and environment and no screen; the program has a screen.
+    bool isOwnCommand = false;
+    QStringList readOnlyFolders; ///< of the host, seen in the sandbox at the same place
+};
+
+/// One whole virtual device: its controls, its files, its log and the sandbox in which the program runs.
+///
+/// Threads: lives in the main thread.
+class Device : public QObject
+{
+    Q_OBJECT
+
+public:
+    explicit Device(DeviceOptions options, QObject* parent = nullptr);
+    ~Device() override;
+
+    /// Makes the device and starts the program in it. Returns what went wrong; nothing is left then.
+    [[nodiscard]] std::optional<QString> start();
+    /// Asks the program to end; `ended` follows.
+    void terminate() { sandbox.terminate(); }
+
+    [[nodiscard]] Registry& registry() { return values; }
+    [[nodiscard]] LogStore& log() { return logStore; }
+    [[nodiscard]] DeviceTree& tree() { return deviceTree; }
+    [[nodiscard]] Sandbox& program() { return sandbox; }
+    [[nodiscard]] const DeviceFolder& folder() const { return deviceFolder; }
+    /// Where a person's VNC viewer finds the screen: "127.0.0.1:PORT".
+    [[nodiscard]] QString vncAddress() const { return relay.address(); }
+    /// The Unix socket on which the program's VNC server can be reached, once it runs.
+    [[nodiscard]] QString vncSocket() const;
+    [[nodiscard]] QString controlSocket() const;
+    [[nodiscard]] QString stateFolder() const;
+
+signals:
+    /// The program's window stands.
+    void ready();
+    /// The program ended with this exit status (128 + the signal's number when one ended it).
+    void ended(int status);
+
+private:
+    [[nodiscard]] std::optional<QString> makeFiles();
+    [[nodiscard]] std::optional<QString> startSandbox();
+    [[nodiscard]] SandboxPlan plan() const;
+    void addScreen(SandboxPlan& plan) const;
+    void addOwnCommand(SandboxPlan& plan) const;
+    void watchForWindow();
+    void tearDown();
+
+    DeviceOptions options;
+    DeviceFolder deviceFolder;
+    Registry values;
+    LogStore logStore;
+    DeviceTree deviceTree;
+    DataPartition dataPartition;
+    VncRelay relay;
+    Sandbox sandbox;
+};
+
+} // namespace VirtualDevice

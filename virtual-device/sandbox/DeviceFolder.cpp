@@ -1,0 +1,201 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "virtual-device/sandbox/DeviceFolder.h"
+
+#include "virtual-device/tree/Mounts.h"
+
+#include <QDir>
+#include <QFileInfo>
+#include <QRegularExpression>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <filesystem>
+
+namespace VirtualDevice
+{
+
+namespace
+{
+
+constexpr int mostDevices = 1000;
+const QString lockSuffix = QStringLiteral(".lock");
+
+QByteArray native(const QString& path)
+{
+    return path.toLocal8Bit();
+}
+
+bool isPrivateFolder(const QString& path)
+{
+    struct stat status
+    {
+    };
+    return ::lstat(native(path).constData(), &status) == 0 && S_ISDIR(status.st_mode) && status.st_uid == ::geteuid() &&
+           (status.st_mode & 0077) == 0;
+}
+
+struct flock wholeFile()
+{
+    struct flock request
+    {
+    };
+    request.l_type = F_WRLCK;
+    request.l_whence = SEEK_SET;
+    return request;
+}
+
+bool isLockedBySomebody(int descriptor)
+{
+    auto request = wholeFile();
+    return ::fcntl(descriptor, F_OFD_GETLK, &request) == 0 && request.l_type != F_UNLCK;
+}
+
+/// The lock's descriptor, or -1 when somebody holds it or the file cannot be made.
+int lockedFile(const QString& path)
+{
+    auto request = wholeFile();
+    for (;;) {
+        const int descriptor = ::open(native(path).constData(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600);
+        if (descriptor < 0)
+            return -1;
+        if (::fcntl(descriptor, F_OFD_SETLK, &request) != 0) {
+            ::close(descriptor);
+            return -1;
+        }
+        struct stat held
+        {
+        };
+        struct stat named
+        {
+        };
+        // The last owner may have removed the file between our open and our lock.
+        if (::fstat(descriptor, &held) == 0 && ::stat(native(path).constData(), &named) == 0 &&
+            held.st_ino == named.st_ino)
+            return descriptor;
+        ::close(descriptor);
+    }
+}
+
+QString lockPath(const QString& name)
+{
+    return DeviceFolder::root() + u'/' + name + lockSuffix;
+}
+
+QStringList knownNames()
+{
+    QStringList names;
+    const auto files = QDir(DeviceFolder::root()).entryList({u'*' + lockSuffix}, QDir::Files | QDir::Hidden);
+    for (const auto& file : files)
+        names.append(file.chopped(lockSuffix.size()));
+    return names;
+}
+
+/// Never enters a file system that is mounted below the folder: what it shows may be the operator's own state.
+void removeFolder(const QString& folder)
+{
+    unmountBelow(folder);
+    if (!mountedBelow(folder).isEmpty())
+        return;
+    std::error_code ignored;
+    std::filesystem::remove_all(folder.toStdString(), ignored);
+}
+
+void unlock(const QString& name, int descriptor)
+{
+    ::unlink(native(lockPath(name)).constData());
+    ::close(descriptor);
+}
+
+} // namespace
+
+DeviceFolder::~DeviceFolder()
+{
+    release();
+}
+
+QString DeviceFolder::root()
+{
+    const QString runtime = qEnvironmentVariable("XDG_RUNTIME_DIR");
+    if (!runtime.isEmpty() && isPrivateFolder(runtime))
+        return runtime + QStringLiteral("/virtual-device");
+    return QStringLiteral("/tmp/virtual-device-%1").arg(::geteuid());
+}
+
+QStringList DeviceFolder::running()
+{
+    QStringList names;
+    for (const auto& name : knownNames()) {
+        const int descriptor = ::open(native(lockPath(name)).constData(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW);
+        if (descriptor < 0)
+            continue;
+        if (isLockedBySomebody(descriptor))
+            names.append(name);
+        ::close(descriptor);
+    }
+    return names;
+}
+
+QString DeviceFolder::controlSocket(const QString& name)
+{
+    return root() + u'/' + name + QStringLiteral("/control");
+}
+
+bool DeviceFolder::isName(const QString& name)
+{
+    static const QRegularExpression allowed(QStringLiteral("\\A[A-Za-z0-9][A-Za-z0-9_-]{0,23}\\z"));
+    return allowed.match(name).hasMatch();
+}
+
+QStringList DeviceFolder::cleanUp()
+{
+    QStringList cleaned;
+    for (const auto& name : knownNames()) {
+        const int descriptor = lockedFile(lockPath(name));
+        if (descriptor < 0)
+            continue;
+        removeFolder(root() + u'/' + name);
+        unlock(name, descriptor);
+        cleaned.append(name);
+    }
+    return cleaned;
+}
+
+std::optional<QString> DeviceFolder::claim(const QString& name)
+{
+    if (!name.isEmpty() && !isName(name))
+        return QStringLiteral("\"%1\" is no device name: letters, digits, \"-\" and \"_\", at most 24").arg(name);
+    ::mkdir(native(root()).constData(), 0700);
+    if (!isPrivateFolder(root()))
+        return QStringLiteral("%1 is not a folder of this user with mode 0700: remove it").arg(root());
+    for (int number = 1; number <= mostDevices && lock < 0; ++number) {
+        deviceName = name.isEmpty() ? QStringLiteral("device-%1").arg(number) : name;
+        lock = lockedFile(lockPath(deviceName));
+        if (lock < 0 && !name.isEmpty())
+            return QStringLiteral("a device named \"%1\" is running: choose another name with --name").arg(name);
+    }
+    removeFolder(path());
+    if (lock < 0 || ::mkdir(native(path()).constData(), 0700) != 0)
+        return QStringLiteral("%1: cannot make the device's folder").arg(path());
+    return std::nullopt;
+}
+
+void DeviceFolder::release()
+{
+    if (lock < 0)
+        return;
+    removeFolder(path());
+    unlock(deviceName, lock);
+    lock = -1;
+}
+
+QString DeviceFolder::path(const QString& relative) const
+{
+    const QString own = root() + u'/' + deviceName;
+    return relative.isEmpty() ? own : own + u'/' + relative;
+}
+
+} // namespace VirtualDevice

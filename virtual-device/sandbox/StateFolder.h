@@ -1,0 +1,21 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#pragma once
+
+#include <QByteArray>
+#include <QString>
+
+#include <optional>
+
+namespace VirtualDevice
+{
+
+/// Lays out the device's ordinary files below `folder`: mnt/boot, mnt/data, mnt/sysdata, etc/sounds/TestSound.wav and
+/// the DSP's firmware image dsp.out. What is there already stays as it is. Returns what went wrong.
+[[nodiscard]] std::optional<QString> prepareState(const QString& folder);
+
+/// The test sound: a WAV file of one second of a 1 kHz tone, 16 kHz, signed 16 bit little-endian, mono.
+[[nodiscard]] QByteArray testSound();
+
+} // namespace VirtualDevice
