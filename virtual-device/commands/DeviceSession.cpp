@@ -27,7 +27,8 @@ void DeviceSession::addOptions(QCommandLineParser& parser)
 {
     parser.addHelpOption();
     parser.addOptions({{"name", "Name the device; by default the first free device-N.", "name"},
-                       {"state", "Keep the device's files in this folder, also after its end.", "folder"}});
+                       {"state", "Keep the device's files in this folder, also after its end.", "folder"},
+                       {"set", "Set a control before the start; may be given several times.", "name=value"}});
     parser.setOptionsAfterPositionalArgumentsMode(QCommandLineParser::ParseAsPositionalArguments);
 }
 
@@ -42,6 +43,7 @@ std::optional<int> DeviceSession::parse(QCommandLineParser& parser, const QStrin
     }
     options.name = parser.value("name");
     options.stateFolder = parser.value("state");
+    options.settings = parser.values("set");
     return std::nullopt;
 }
 

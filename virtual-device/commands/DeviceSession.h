@@ -30,6 +30,9 @@ public:
     /// Checks the machine, starts the device and returns the exit status when everything is gone again.
     [[nodiscard]] int run();
 
+    /// Somebody interrupted us, so that whatever the program does now is no news.
+    [[nodiscard]] bool isAskedToEnd() const { return isAsked; }
+
 private:
     EndSignals endSignals;
     Device virtualDevice;

@@ -10,6 +10,8 @@
 #include <QFileInfo>
 #include <QTextStream>
 
+#include <algorithm>
+
 namespace VirtualDevice
 {
 
@@ -37,6 +39,16 @@ void announce(const Device& device)
     QTextStream(stdout) << "ready: VNC " << device.vncAddress() << ", control " << device.controlSocket() << Qt::endl;
 }
 
+/// A program that fails says why on its error output, which nobody sees while it runs.
+void explainEnd(Sandbox& program, int status)
+{
+    constexpr qsizetype mostLines = 10;
+    const auto output = program.output();
+    for (const auto& line : output.last(std::min(output.size(), mostLines)))
+        QTextStream(stderr) << QString::fromLocal8Bit(line) << Qt::endl;
+    DeviceSession::complain(QStringLiteral("the program ended with status %1").arg(status), status);
+}
+
 } // namespace
 
 int runCommand(const QStringList& arguments)
@@ -58,6 +70,10 @@ int runCommand(const QStringList& arguments)
         return DeviceSession::complain(*problem, ExitStatus::failure);
     DeviceSession session(options);
     QObject::connect(&session.device(), &Device::ready, [&] { announce(session.device()); });
+    QObject::connect(&session.device(), &Device::ended, [&](int status) {
+        if (status != 0 && !session.isAskedToEnd())
+            explainEnd(session.device().program(), status);
+    });
     return session.run();
 }
 

@@ -25,12 +25,14 @@ const QString stalledControl = QStringLiteral("log.stalled");
 } // namespace
 
 Device::Device(DeviceOptions choices, QObject* parent)
-    : QObject(parent), options(std::move(choices)), deviceTree(values), dataPartition(values)
+    : QObject(parent), options(std::move(choices)), radio(values), deviceTree(values), dataPartition(values)
 {
     connect(&values, &Registry::changed, &logStore, [this](const QString& name, const QJsonValue& value) {
         if (name == stalledControl)
             logStore.setStalled(value.toBool());
     });
+    // Direct: the pulse counts before the first byte that the program sends after it.
+    connect(&deviceTree, &DeviceTree::resetLineWritten, &radio, &RadioModel::reset, Qt::DirectConnection);
     connect(&sandbox, &Sandbox::ended, this, [this](int status) {
         tearDown();
         emit ended(status);
@@ -45,7 +47,9 @@ Device::~Device()
 std::optional<QString> Device::start()
 {
     DeviceFolder::cleanUp();
-    auto problem = deviceFolder.claim(options.name);
+    auto problem = applySettings();
+    if (!problem)
+        problem = deviceFolder.claim(options.name);
     if (!problem)
         problem = makeFiles();
     if (!problem)
@@ -53,6 +57,18 @@ std::optional<QString> Device::start()
     if (problem)
         tearDown();
     return problem;
+}
+
+std::optional<QString> Device::applySettings()
+{
+    for (const auto& setting : std::as_const(options.settings)) {
+        const QString name = setting.section(u'=', 0, 0);
+        const ControlSpec* control = Registry::find(name);
+        const QJsonValue value = control ? Registry::parsed(*control, setting.section(u'=', 1)) : QJsonValue();
+        if (auto problem = values.set(name, value))
+            return problem;
+    }
+    return std::nullopt;
 }
 
 std::optional<QString> Device::makeFiles()
@@ -83,16 +99,10 @@ std::optional<QString> Device::startSandbox()
 
 SandboxPlan Device::plan() const
 {
-    const QString state = stateFolder();
     SandboxPlan plan;
     plan.command = options.command;
-    plan.add(deviceFolder.path(QStringLiteral("tree/sys")), QStringLiteral("/sys"), Kind::Writable);
-    plan.add(deviceFolder.path(QStringLiteral("tree/rtc")), QStringLiteral("/dev/rtc"), Kind::Writable);
-    plan.add(deviceFolder.path(QStringLiteral("log")), QStringLiteral("/dev/log"), Kind::Writable);
-    plan.add(state + QStringLiteral("/mnt"), QStringLiteral("/mnt"), Kind::Writable);
-    plan.add(deviceFolder.path(QStringLiteral("card")), QStringLiteral("/mnt/data"), Kind::Writable);
-    plan.add(state + QStringLiteral("/etc/sounds"), QStringLiteral("/etc/sounds"), Kind::Writable);
-    plan.binds.append({state + QStringLiteral("/dsp.out"), QStringLiteral("/dsp.out"), Kind::ReadOnly, true});
+    addFiles(plan);
+    addModels(plan);
     for (const auto& folder : options.readOnlyFolders)
         plan.add(folder, folder, Kind::ReadOnly);
     if (options.isOwnCommand)
@@ -100,6 +110,25 @@ SandboxPlan Device::plan() const
     else
         addScreen(plan);
     return plan;
+}
+
+void Device::addFiles(SandboxPlan& plan) const
+{
+    const QString state = stateFolder();
+    plan.add(deviceFolder.path(QStringLiteral("tree/sys")), QStringLiteral("/sys"), Kind::Writable);
+    plan.add(deviceFolder.path(QStringLiteral("tree/rtc")), QStringLiteral("/dev/rtc"), Kind::Writable);
+    plan.add(deviceFolder.path(QStringLiteral("log")), QStringLiteral("/dev/log"), Kind::Writable);
+    plan.add(state + QStringLiteral("/mnt"), QStringLiteral("/mnt"), Kind::Writable);
+    plan.add(deviceFolder.path(QStringLiteral("card")), QStringLiteral("/mnt/data"), Kind::Writable);
+    plan.add(state + QStringLiteral("/etc/sounds"), QStringLiteral("/etc/sounds"), Kind::Writable);
+    plan.binds.append({state + QStringLiteral("/dsp.out"), QStringLiteral("/dsp.out"), Kind::ReadOnly, true});
+}
+
+/// What is missing when the surroundings are built is missing for the program's whole run.
+void Device::addModels(SandboxPlan& plan) const
+{
+    if (values.text(QStringLiteral("radio.presence")) == u"present" && !radio.devicePath().isEmpty())
+        plan.add(radio.devicePath(), QStringLiteral("/dev/ttyS1"), Kind::Device);
 }
 
 void Device::addScreen(SandboxPlan& plan) const

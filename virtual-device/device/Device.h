@@ -4,6 +4,7 @@
 #pragma once
 
 #include "virtual-device/log/LogStore.h"
+#include "virtual-device/radio/RadioModel.h"
 #include "virtual-device/registry/Registry.h"
 #include "virtual-device/sandbox/DeviceFolder.h"
 #include "virtual-device/sandbox/Sandbox.h"
@@ -29,6 +30,7 @@ struct DeviceOptions
     /// A person's own command has the caller's terminal and environment and no screen; the program has a screen.
     bool isOwnCommand = false;
     QStringList readOnlyFolders; ///< of the host, seen in the sandbox at the same place
+    QStringList settings;        ///< "NAME=VALUE" of controls, in force before the program starts
 };
 
 /// One whole virtual device: its controls, its files, its log and the sandbox in which the program runs.
@@ -66,9 +68,12 @@ signals:
     void ended(int status);
 
 private:
+    [[nodiscard]] std::optional<QString> applySettings();
     [[nodiscard]] std::optional<QString> makeFiles();
     [[nodiscard]] std::optional<QString> startSandbox();
     [[nodiscard]] SandboxPlan plan() const;
+    void addFiles(SandboxPlan& plan) const;
+    void addModels(SandboxPlan& plan) const;
     void addScreen(SandboxPlan& plan) const;
     void addOwnCommand(SandboxPlan& plan) const;
     void watchForWindow();
@@ -78,6 +83,7 @@ private:
     DeviceFolder deviceFolder;
     Registry values;
     LogStore logStore;
+    RadioModel radio;
     DeviceTree deviceTree;
     DataPartition dataPartition;
     VncRelay relay;

@@ -70,9 +70,11 @@ struct PartitionOperations
         return refusal != 0 ? -refusal : outcome(action());
     }
 
+    /// The kernel keeps the root of what is mounted; a failing card shows below it.
     static int getattr(const char* path, struct stat* status, fuse_file_info* info)
     {
-        return unless(card().failure(), [&] {
+        const bool isRoot = std::strcmp(path, "/") == 0;
+        return unless(isRoot ? 0 : card().failure(), [&] {
             return info != nullptr ? ::fstat(descriptorOf(info), status)
                                    : ::fstatat(root(), below(path), status, AT_SYMLINK_NOFOLLOW);
         });

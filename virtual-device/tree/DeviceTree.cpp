@@ -249,13 +249,14 @@ int DeviceTree::fault(const TreeEntry& entry) const
     return entry.fault.empty() ? 0 : errorNumber(registry.text(nameOf(entry.fault)));
 }
 
+/// The clock is bound into the sandbox by itself: its name stays, and only opening it says that it is gone.
 bool DeviceTree::isThere(const TreeEntry& entry) const
 {
     if (!entry.presence.empty() && !registry.flag(nameOf(entry.presence)))
         return false;
     if (entry.kind == TreeEntry::Kind::Folder)
         return entry.fault.empty() || registry.text(nameOf(entry.fault)) != u"dangling";
-    return fault(entry) != ENOENT;
+    return entry.kind == TreeEntry::Kind::Clock || fault(entry) != ENOENT;
 }
 
 int DeviceTree::lookUp(const TreeEntry& entry) const
@@ -269,10 +270,11 @@ int DeviceTree::open(const TreeEntry& entry, int flags) const
 {
     if (!isThere(entry))
         return ENOENT;
+    const int error = fault(entry);
     const bool wantsToWrite = (flags & O_ACCMODE) != O_RDONLY;
-    if (fault(entry) == EACCES || (wantsToWrite && (entry.permissions & 0222) == 0))
-        return EACCES;
-    return 0;
+    if (error == ENOENT || error == EACCES)
+        return error;
+    return wantsToWrite && (entry.permissions & 0222) == 0 ? EACCES : 0;
 }
 
 int DeviceTree::refresh(OpenFile& file) const
