@@ -1,0 +1,213 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "DataSource/src/FileStore.h"
+
+#include "DataSource/src/FileStoreContents.h"
+#include "DataSource/src/FileSystemSpace.h"
+#include "utilities/Debug.h"
+
+#include <QDir>
+#include <QDirIterator>
+#include <QFutureWatcher>
+#include <QtConcurrent>
+
+#include <optional>
+
+namespace DataSource
+{
+
+namespace
+{
+
+/// Line numbers that monitoring matches in the log.
+constexpr int deleteWhileDeletingLine = 309;
+constexpr int deleteWhileScanningLine = 314;
+constexpr int deleteBeyondEndLine = 333;
+constexpr int deleteNothingLine = 347;
+constexpr int unknownFreeSpaceLine = 429;
+constexpr int unknownCapacityLine = 457;
+constexpr int scanWhileScanningLine = 474;
+constexpr int scanWhileDeletingLine = 479;
+
+void warn(int line, const QString& text)
+{
+    Utilities::Debug::warningMessage(__FILE__, line, text);
+}
+
+} // namespace
+
+class FileStore::PrivateData
+{
+public:
+    PrivateData(FileStore* store, const QString& path)
+        : directory(path),
+          contents(std::make_shared<FileStoreContents>(
+              directory.absolutePath(), [store](qint32 percent) { emit store->deleteProgress(percent); }))
+    {
+    }
+
+    [[nodiscard]] FileSystemSpace space(int warningLine) const;
+    [[nodiscard]] std::optional<QFileInfo> fileToDelete(unsigned int index) const;
+
+    const QDir directory;
+    const std::shared_ptr<FileStoreContents> contents;
+    std::atomic<bool> scanning = false;
+    std::atomic<bool> deleting = false;
+    /// Of the latest scan: a stopped one must stay stopped when the next one starts.
+    std::shared_ptr<std::atomic<bool>> scanWanted = std::make_shared<std::atomic<bool>>(false);
+    QFuture<void> scanFuture;
+    QFutureWatcher<void> scanWatcher;
+    QFuture<void> deleteFuture;
+    QFutureWatcher<void> deleteWatcher;
+};
+
+FileSystemSpace FileStore::PrivateData::space(int warningLine) const
+{
+    if (!directory.exists())
+        return {};
+    const auto space = FileSystemSpace::of(directory.absolutePath());
+    if (!space)
+        warn(warningLine, QStringLiteral("Unable to obtain file system information"));
+    return space.value_or(FileSystemSpace());
+}
+
+std::optional<QFileInfo> FileStore::PrivateData::fileToDelete(unsigned int index) const
+{
+    QDirIterator listing(directory.absolutePath(), QDir::Files);
+    QFileInfo file;
+    if (listing.hasNext())
+        file = listing.nextFileInfo();
+    for (unsigned int position = 0; position < index; ++position) {
+        if (!listing.hasNext()) {
+            warn(deleteBeyondEndLine, QStringLiteral("Attempting to delete a file index larger than the number of "
+                                                     "files in the directory"));
+            return std::nullopt;
+        }
+        file = listing.nextFileInfo();
+    }
+    if (!file.exists()) {
+        warn(deleteNothingLine, QStringLiteral("Attempting to delete a file that does not exist"));
+        return std::nullopt;
+    }
+    return file;
+}
+
+FileStore::FileStore(const QString& path) : d(std::make_unique<PrivateData>(this, path))
+{
+    if (!d->directory.exists())
+        d->directory.mkpath(d->directory.absolutePath());
+    d->contents->fillCache();
+    connect(&d->scanWatcher, &QFutureWatcherBase::finished, this, &FileStore::scanningDone);
+    connect(&d->deleteWatcher, &QFutureWatcherBase::finished, this, &FileStore::deletingDone);
+}
+
+FileStore::~FileStore()
+{
+    stopScanning();
+    d->contents->releaseOwner();
+}
+
+QFileInfo FileStore::createFile(const QString& name)
+{
+    return QFileInfo(d->directory.absoluteFilePath(name));
+}
+
+QFileInfo FileStore::fileAt(int index) const
+{
+    return d->contents->recordAt(index);
+}
+
+int FileStore::count() const
+{
+    return d->contents->count();
+}
+
+qint64 FileStore::bytesUsed() const
+{
+    return d->contents->bytesUsed();
+}
+
+qint64 FileStore::bytesFree() const
+{
+    return d->space(unknownFreeSpaceLine).free;
+}
+
+qint64 FileStore::bytesCapacity() const
+{
+    return d->space(unknownCapacityLine).capacity;
+}
+
+bool FileStore::isScanning() const
+{
+    return d->scanning;
+}
+
+bool FileStore::isDeleting() const
+{
+    return d->deleting;
+}
+
+void FileStore::rescan()
+{
+    if (d->scanning) {
+        warn(scanWhileScanningLine, QStringLiteral("Attempting to start a new scan while a scan is in progress."));
+        return;
+    }
+    if (d->deleting) {
+        warn(scanWhileDeletingLine, QStringLiteral("Attempting to start a scan while a deletion is in progress."));
+        return;
+    }
+    d->scanning = true;
+    d->scanWanted = std::make_shared<std::atomic<bool>>(true);
+    // A stopped scan may still be on its way to the end of its entry; tasks never overlap.
+    d->scanFuture =
+        QtConcurrent::run([contents = d->contents, wanted = d->scanWanted, previous = d->scanFuture]() mutable {
+            previous.waitForFinished();
+            contents->scanDirectory(*wanted);
+        });
+    d->scanWatcher.setFuture(d->scanFuture);
+}
+
+void FileStore::stopScanning()
+{
+    d->scanning = false;
+    *d->scanWanted = false;
+}
+
+/// The report of a stopped scan may arrive when the next one runs already; that one is not done before its future is.
+void FileStore::scanningDone()
+{
+    if (d->scanFuture.isFinished() && d->scanning.exchange(false))
+        emit scanComplete();
+}
+
+void FileStore::deleteFile(unsigned int index)
+{
+    if (d->deleting) {
+        warn(deleteWhileDeletingLine, QStringLiteral("Attempting to delete a file while a deletion is in progress."));
+        return;
+    }
+    if (d->scanning) {
+        warn(deleteWhileScanningLine, QStringLiteral("Attempting to delete a file while a scan is in progress."));
+        return;
+    }
+    const auto file = d->fileToDelete(index);
+    if (!file)
+        return;
+    d->deleting = true;
+    d->deleteFuture = QtConcurrent::run(
+        [contents = d->contents, filePath = file->absoluteFilePath(), stoppedScan = d->scanFuture]() mutable {
+            stoppedScan.waitForFinished();
+            contents->deleteFile(filePath);
+        });
+    d->deleteWatcher.setFuture(d->deleteFuture);
+}
+
+void FileStore::deletingDone()
+{
+    if (d->deleting.exchange(false))
+        emit deleteComplete();
+}
+
+} // namespace DataSource

@@ -1,0 +1,24 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "DataSource/src/FileSystemSpace.h"
+
+#include <QFile>
+
+#include <sys/statvfs.h>
+
+namespace DataSource
+{
+
+std::optional<FileSystemSpace> FileSystemSpace::of(const QString& directory)
+{
+    struct statvfs status
+    {
+    };
+    if (::statvfs(QFile::encodeName(directory).constData(), &status) != 0)
+        return std::nullopt;
+    return FileSystemSpace{static_cast<qint64>(status.f_bsize * status.f_blocks),
+                           static_cast<qint64>(status.f_bsize * status.f_bfree)};
+}
+
+} // namespace DataSource
