@@ -23,6 +23,8 @@ struct Row
 constexpr std::array rows{
     Row{"run", VirtualDevice::runCommand, "start a device and the program on it"},
     Row{"exec", VirtualDevice::execCommand, "run a command of your own in a device's sandbox"},
+    Row{"ctl", VirtualDevice::ctlCommand, "look at a running device, change it, press its keys, wait for it"},
+    Row{"controls", VirtualDevice::controlsCommand, "explain every control that ctl can get and set"},
 };
 
 void writeUsage(QTextStream stream)

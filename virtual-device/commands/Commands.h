@@ -24,5 +24,9 @@ using Subcommand = int (*)(const QStringList& arguments);
 [[nodiscard]] int runCommand(const QStringList& arguments);
 /// Starts a device and runs a command of the caller's in the program's place; returns the command's exit status.
 [[nodiscard]] int execCommand(const QStringList& arguments);
+/// One request to a running device.
+[[nodiscard]] int ctlCommand(const QStringList& arguments);
+/// Prints the table of controls.
+[[nodiscard]] int controlsCommand(const QStringList& arguments);
 
 } // namespace VirtualDevice

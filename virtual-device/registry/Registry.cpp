@@ -33,21 +33,6 @@ bool isWholeNumberWithin(const QJsonValue& value, std::int64_t minimum, std::int
            number <= static_cast<double>(maximum);
 }
 
-bool fits(const ControlSpec& spec, const QJsonValue& value)
-{
-    switch (spec.type) {
-    case ControlType::Integer:
-        return isWholeNumberWithin(value, spec.minimum, spec.maximum);
-    case ControlType::Boolean:
-        return value.isBool();
-    case ControlType::Choice:
-        return value.isString() && choicesOf(spec).contains(value.toString());
-    case ControlType::Text:
-        return value.isString() && value.toString().size() <= spec.maximum;
-    }
-    return false;
-}
-
 } // namespace
 
 Registry::Registry(QObject* parent) : QObject(parent)
@@ -62,6 +47,21 @@ const ControlSpec* Registry::find(const QString& name)
     const auto found =
         std::find_if(table.begin(), table.end(), [&](const ControlSpec& spec) { return fromView(spec.name) == name; });
     return found == table.end() ? nullptr : &*found;
+}
+
+bool Registry::accepts(const ControlSpec& spec, const QJsonValue& value)
+{
+    switch (spec.type) {
+    case ControlType::Integer:
+        return isWholeNumberWithin(value, spec.minimum, spec.maximum);
+    case ControlType::Boolean:
+        return value.isBool();
+    case ControlType::Choice:
+        return value.isString() && choicesOf(spec).contains(value.toString());
+    case ControlType::Text:
+        return value.isString() && value.toString().size() <= spec.maximum;
+    }
+    return false;
 }
 
 QString Registry::allowed(const ControlSpec& spec)
@@ -127,7 +127,7 @@ std::optional<QString> Registry::set(const QString& name, const QJsonValue& valu
         return QStringLiteral("unknown control \"%1\"").arg(name);
     if (spec->access == ControlAccess::Device)
         return QStringLiteral("control \"%1\" is read only").arg(name);
-    if (!fits(*spec, value))
+    if (!accepts(*spec, value))
         return QStringLiteral("control \"%1\" takes %2").arg(name, allowed(*spec));
     store(name, value);
     return std::nullopt;

@@ -30,6 +30,8 @@ public:
     [[nodiscard]] static const ControlSpec* find(const QString& name);
     /// What a person may give for the control, for help and error texts: "-10..10 uV", "true or false", "on|off".
     [[nodiscard]] static QString allowed(const ControlSpec& spec);
+    /// Whether the value has the control's type and lies in its range, whoever may set it.
+    [[nodiscard]] static bool accepts(const ControlSpec& spec, const QJsonValue& value);
     /// A word from the command line as the control's JSON type; null when it is none.
     [[nodiscard]] static QJsonValue parsed(const ControlSpec& spec, const QString& word);
 

@@ -1,0 +1,104 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#pragma once
+
+#include "virtual-device/control/ControlClient.h"
+
+#include <QImage>
+#include <QJsonValue>
+#include <QProcess>
+#include <QString>
+#include <QStringList>
+
+#include <chrono>
+
+namespace TestSupport
+{
+
+/// A virtual device with the program on it, as a test drives it: `virtual-device run` of $IMMUNITYRIG_BUILD, under a
+/// name of its own, so that many may run at once. Ends with the object.
+///
+/// A test that itself runs inside `virtual-device exec` calls `attach()` instead of `start()`.
+///
+/// Everything that can fail returns false, and `error()` says why:
+///
+///     DeviceUnderTest device;
+///     QVERIFY2(device.start(), qPrintable(device.error()));
+///     QVERIFY2(device.set("usb.hid", false), qPrintable(device.error()));
+///     QVERIFY2(device.waitRegion("usb-device", "red"), qPrintable(device.error()));
+///
+/// Threads: the test's own, which runs its event loop while it waits. Needs an application object.
+class DeviceUnderTest
+{
+public:
+    static constexpr std::chrono::seconds usual{20};
+    static constexpr std::chrono::seconds startLimit{60};
+
+    DeviceUnderTest();
+    ~DeviceUnderTest();
+    DeviceUnderTest(const DeviceUnderTest&) = delete;
+    DeviceUnderTest& operator=(const DeviceUnderTest&) = delete;
+
+    /// Further arguments of `virtual-device run`. Returns when the window stands.
+    [[nodiscard]] bool start(const QStringList& arguments = {});
+    /// Speaks to the device in whose `virtual-device exec` the test runs ($VIRTUAL_DEVICE_CONTROL).
+    [[nodiscard]] bool attach();
+    /// As Ctrl-C does; kills what does not end.
+    void stop();
+
+    /// Types as in the control table: a number, true or false, a text.
+    [[nodiscard]] bool set(const QString& control, const QJsonValue& value);
+    /// Undefined when it fails.
+    [[nodiscard]] QJsonValue get(const QString& control);
+
+    // Keys as in `VirtualDevice::KeyTable`. A pressed key stays down; a tap is a press and a release.
+    [[nodiscard]] bool press(const QString& key);
+    [[nodiscard]] bool release(const QString& key);
+    [[nodiscard]] bool tap(const QString& key);
+    [[nodiscard]] bool hold(const QString& key, std::chrono::milliseconds duration);
+
+    // Regions as in `VirtualDevice::RegionMap`; colours: green, red, white, other, none.
+    [[nodiscard]] bool waitRegion(const QString& region, const QString& colour,
+                                  std::chrono::milliseconds limit = usual);
+    [[nodiscard]] bool waitControl(const QString& control, const QJsonValue& value,
+                                   std::chrono::milliseconds limit = usual);
+    /// A line that contains the text, among those that came after the mark (0: since the device's start).
+    [[nodiscard]] bool waitLog(const QString& text, std::chrono::milliseconds limit = usual, qint64 after = 0);
+
+    /// Empty when it fails.
+    [[nodiscard]] QString regionColour(const QString& region);
+    /// The number of the newest log line, for `waitLog` and `logTexts`.
+    [[nodiscard]] qint64 logMark();
+    [[nodiscard]] QStringList logTexts(qint64 after = 0);
+    /// Null when it fails.
+    [[nodiscard]] QImage screenshot();
+
+    /// Any other request; `error()` is set when it is refused.
+    VirtualDevice::ControlReply call(const QString& method, const QJsonObject& params = {});
+    [[nodiscard]] VirtualDevice::ControlClient& client() { return connection; }
+
+    [[nodiscard]] QString name() const { return deviceName; }
+    [[nodiscard]] QString controlSocket() const { return socketPath; }
+    /// The line that begins with "ready".
+    [[nodiscard]] QString readyLine() const { return ready; }
+    [[nodiscard]] QProcess& process() { return runner; }
+    [[nodiscard]] QString error() const { return problem; }
+    /// What `virtual-device run` has written so far, both streams.
+    [[nodiscard]] QString output() const { return QString::fromUtf8(written); }
+
+private:
+    [[nodiscard]] bool fail(const QString& text);
+    [[nodiscard]] bool connectTo(const QString& path);
+    [[nodiscard]] bool waitFor(const QJsonObject& condition, std::chrono::milliseconds limit);
+
+    QString deviceName;
+    QString socketPath;
+    QString ready;
+    QString problem;
+    QByteArray written;
+    QProcess runner;
+    VirtualDevice::ControlClient connection;
+};
+
+} // namespace TestSupport

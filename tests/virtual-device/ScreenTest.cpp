@@ -1,0 +1,286 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "virtual-device/screen/Screen.h"
+
+#include "tests/virtual-device/SampleProgram.h"
+#include "virtual-device/screen/KeyTable.h"
+#include "virtual-device/screen/RegionMap.h"
+#include "virtual-device/screen/RegionWatch.h"
+
+#include <QElapsedTimer>
+#include <QSignalSpy>
+#include <QTemporaryDir>
+#include <QTest>
+
+#include <memory>
+
+using namespace VirtualDevice;
+using TestSupport::SampleProgram;
+
+namespace
+{
+
+constexpr int limit = 20000;
+
+} // namespace
+
+class ScreenTest : public QObject
+{
+    Q_OBJECT
+
+private slots:
+    void init();
+    void cleanup();
+
+    void pictureHasTheWindowsSizeAndColours();
+    void noPictureAndNoKeyBeforeTheProgramStands();
+    void everyKeyReachesTheProgramWithItsCode_data();
+    void everyKeyReachesTheProgramWithItsCode();
+    void namesOfAKeyMeanTheSameInAnyCase();
+    void unknownKeyIsRefused();
+    void heldKeyIsReleasedAfterItsTime();
+    void labelOfAKeyIsGreenWhileItIsDown();
+    void regionsFollowTheirLabels();
+    void regionsHaveNoColourOnceTheProgramIsGone();
+    void pngFileHoldsThePicture();
+    void screenComesBackWithANewProgram();
+    void frozenProgramHoldsNobodyUp();
+    void screenEndsWhileTheProgramIsFrozenInTheHandshake();
+
+    void everyRegionOfTheMapHasAUniqueName();
+    void dominantColourIsTheMostFrequentOne();
+
+private:
+    [[nodiscard]] bool waitForPicture() const;
+    [[nodiscard]] bool waitForKeyEvents(const QStringList& expected);
+
+    std::unique_ptr<SampleProgram> program;
+    std::unique_ptr<Screen> screen;
+    std::unique_ptr<RegionWatch> regions;
+};
+
+void ScreenTest::init()
+{
+    program = std::make_unique<SampleProgram>();
+    screen = std::make_unique<Screen>();
+    regions = std::make_unique<RegionWatch>(*screen);
+    screen->open(program->socketPath());
+    if (QByteArray(QTest::currentTestFunction()) == "noPictureAndNoKeyBeforeTheProgramStands")
+        return;
+    QVERIFY(program->start());
+    QVERIFY(waitForPicture());
+}
+
+void ScreenTest::cleanup()
+{
+    regions.reset();
+    screen.reset();
+    program.reset();
+}
+
+bool ScreenTest::waitForPicture() const
+{
+    return QTest::qWaitFor([this] { return regions->colour("key.sel") == RegionColour::White; }, limit);
+}
+
+bool ScreenTest::waitForKeyEvents(const QStringList& expected)
+{
+    return QTest::qWaitFor([&] { return program->keyEvents().size() >= expected.size(); }, limit) &&
+           program->keyEvents() == expected;
+}
+
+void ScreenTest::pictureHasTheWindowsSizeAndColours()
+{
+    const QImage picture = screen->picture();
+    QCOMPARE(picture.size(), QSize(240, 320));
+    QCOMPARE(picture.pixelColor(2, 96), QColor(255, 0, 0));
+    QCOMPARE(picture.pixelColor(0, 94), QColor(0, 0, 0));
+    QCOMPARE(picture.pixelColor(2, 34), QColor(255, 255, 255));
+}
+
+void ScreenTest::noPictureAndNoKeyBeforeTheProgramStands()
+{
+    QVERIFY(!screen->isConnected());
+    QVERIFY(screen->picture().isNull());
+    QVERIFY(screen->png().isEmpty());
+    QVERIFY(!screen->press("F5"));
+    QVERIFY(!screen->hold("F5", std::chrono::milliseconds(1)));
+    QCOMPARE(regions->colour("trigger"), RegionColour::None);
+    QVERIFY(program->start());
+    QVERIFY(waitForPicture());
+    QVERIFY(screen->isConnected());
+}
+
+void ScreenTest::everyKeyReachesTheProgramWithItsCode_data()
+{
+    QTest::addColumn<int>("code");
+    QTest::addRow("Return") << int(Qt::Key_Return);
+    QTest::addRow("Up") << int(Qt::Key_Up);
+    QTest::addRow("Down") << int(Qt::Key_Down);
+    QTest::addRow("Left") << int(Qt::Key_Left);
+    QTest::addRow("Right") << int(Qt::Key_Right);
+    QTest::addRow("F5") << int(Qt::Key_F5);
+    QTest::addRow("F6") << int(Qt::Key_F6);
+    QTest::addRow("F7") << int(Qt::Key_F7);
+    QTest::addRow("F8") << int(Qt::Key_F8);
+    QTest::addRow("F9") << int(Qt::Key_F9);
+    QTest::addRow("F10") << int(Qt::Key_F10);
+    QTest::addRow("F11") << int(Qt::Key_F11);
+    QTest::addRow("F12") << int(Qt::Key_F12);
+    QTest::addRow("Escape") << int(Qt::Key_Escape);
+    QTest::addRow("Space") << int(Qt::Key_Space);
+    QTest::addRow("x") << int(Qt::Key_X);
+    QTest::addRow("7") << int(Qt::Key_7);
+}
+
+void ScreenTest::everyKeyReachesTheProgramWithItsCode()
+{
+    QFETCH(const int, code);
+    QVERIFY(screen->press(QTest::currentDataTag()));
+    QVERIFY(screen->release(QTest::currentDataTag()));
+    QVERIFY(waitForKeyEvents({QString("press %1").arg(code), QString("release %1").arg(code)}));
+}
+
+void ScreenTest::namesOfAKeyMeanTheSameInAnyCase()
+{
+    QCOMPARE(KeyTable::symbol("soft1"), KeyTable::symbol("F5"));
+    QCOMPARE(KeyTable::symbol("TRIGGER"), KeyTable::symbol("f10"));
+    QCOMPARE(KeyTable::symbol("Radio"), KeyTable::symbol("F11"));
+    QCOMPARE(KeyTable::symbol("Power"), KeyTable::symbol("F12"));
+    QCOMPARE(KeyTable::symbol("Enter"), KeyTable::symbol("Return"));
+    QCOMPARE(KeyTable::symbol("Q"), KeyTable::symbol("q"));
+}
+
+void ScreenTest::unknownKeyIsRefused()
+{
+    for (const auto* name : {"", "F13", "Soft4", "ab", "|", "Return|Enter", "\xc3\xa4"})
+        QVERIFY2(!screen->press(QString::fromUtf8(name)), name);
+    QVERIFY(screen->press("a"));
+    QVERIFY(waitForKeyEvents({QString("press %1").arg(int(Qt::Key_A))}));
+}
+
+void ScreenTest::heldKeyIsReleasedAfterItsTime()
+{
+    constexpr std::chrono::milliseconds duration(300);
+    QElapsedTimer clock;
+    qint64 releasedAfter = 0;
+    clock.start();
+    QVERIFY(screen->hold("F5", duration, [&] { releasedAfter = clock.elapsed(); }));
+    QVERIFY(waitForKeyEvents({QString("press %1").arg(int(Qt::Key_F5)), QString("release %1").arg(int(Qt::Key_F5))}));
+    QVERIFY(releasedAfter >= duration.count());
+}
+
+void ScreenTest::labelOfAKeyIsGreenWhileItIsDown()
+{
+    QVERIFY(screen->press("Down"));
+    QTRY_COMPARE_WITH_TIMEOUT(regions->colour("key.down"), RegionColour::Green, limit);
+    QCOMPARE(regions->colour("key.up"), RegionColour::White);
+    QVERIFY(screen->release("Down"));
+    QTRY_COMPARE_WITH_TIMEOUT(regions->colour("key.down"), RegionColour::White, limit);
+}
+
+void ScreenTest::regionsFollowTheirLabels()
+{
+    const QStringList labels{"usb-device", "usb-gadget", "trigger", "sd-card", "rf.beacon", "rf.radios"};
+    const auto allAre = [&](RegionColour colour) {
+        return std::all_of(labels.begin(), labels.end(),
+                           [&](const QString& name) { return regions->colour(name) == colour; });
+    };
+    QVERIFY(QTest::qWaitFor([&] { return allAre(RegionColour::Red); }, limit));
+    QSignalSpy changes(regions.get(), &RegionWatch::changed);
+    QVERIFY(screen->press("g"));
+    QVERIFY(QTest::qWaitFor([&] { return allAre(RegionColour::Green); }, limit));
+    QCOMPARE(changes.count(), labels.size());
+    QVERIFY(screen->press("w"));
+    QVERIFY(QTest::qWaitFor([&] { return allAre(RegionColour::White); }, limit));
+    QCOMPARE(regions->colour("fuel-gauge"), RegionColour::Other);
+}
+
+void ScreenTest::regionsHaveNoColourOnceTheProgramIsGone()
+{
+    QSignalSpy closed(screen.get(), &Screen::closed);
+    program->stop();
+    QVERIFY(closed.wait(limit));
+    QCOMPARE(regions->colour("key.sel"), RegionColour::None);
+    QCOMPARE(regions->colour("trigger"), RegionColour::None);
+    QVERIFY(screen->picture().isNull());
+}
+
+void ScreenTest::pngFileHoldsThePicture()
+{
+    const QTemporaryDir folder;
+    const QString path = folder.filePath("window.png");
+    QVERIFY(screen->writePng(path));
+    QCOMPARE(QImage(path).convertToFormat(QImage::Format_RGB32), screen->picture());
+    QCOMPARE(QImage::fromData(screen->png(), "PNG").convertToFormat(QImage::Format_RGB32), screen->picture());
+    QVERIFY(!screen->writePng(folder.filePath("missing/window.png")));
+}
+
+void ScreenTest::screenComesBackWithANewProgram()
+{
+    QSignalSpy opened(screen.get(), &Screen::opened);
+    program->stop();
+    QTRY_VERIFY_WITH_TIMEOUT(!screen->isConnected(), limit);
+    QVERIFY(program->start());
+    QTRY_VERIFY_WITH_TIMEOUT(screen->isConnected(), limit);
+    QVERIFY(waitForPicture());
+    QCOMPARE(opened.count(), 1);
+    QVERIFY(screen->press("F5"));
+    QVERIFY(waitForKeyEvents({QString("press %1").arg(int(Qt::Key_F5))}));
+}
+
+void ScreenTest::frozenProgramHoldsNobodyUp()
+{
+    program->freeze();
+    QVERIFY(screen->press("F5"));
+    QVERIFY(screen->release("F5"));
+    QVERIFY(!screen->picture().isNull());
+    program->thaw();
+    QVERIFY(waitForKeyEvents({QString("press %1").arg(int(Qt::Key_F5)), QString("release %1").arg(int(Qt::Key_F5))}));
+}
+
+void ScreenTest::screenEndsWhileTheProgramIsFrozenInTheHandshake()
+{
+    program->freeze();
+    auto second = std::make_unique<Screen>();
+    QSignalSpy opened(second.get(), &Screen::opened);
+    second->open(program->socketPath());
+    QVERIFY(!opened.wait(200));
+    second.reset();
+    program->thaw();
+}
+
+void ScreenTest::everyRegionOfTheMapHasAUniqueName()
+{
+    const QStringList names = RegionMap::names();
+    QCOMPARE(QSet<QString>(names.begin(), names.end()).size(), names.size());
+    for (const auto& name : names) {
+        QVERIFY(RegionMap::find(name) != nullptr);
+        QVERIFY2(!RegionMap::find(name)->help.empty(), qPrintable(name));
+    }
+    QCOMPARE(RegionMap::find("nowhere"), nullptr);
+}
+
+void ScreenTest::dominantColourIsTheMostFrequentOne()
+{
+    QImage picture(10, 10, QImage::Format_RGB32);
+    picture.fill(qRgb(0, 128, 0));
+    for (int x = 0; x < 10; ++x)
+        for (int y = 0; y < 4; ++y)
+            picture.setPixelColor(x, y, Qt::black);
+    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 10}), RegionColour::Green);
+    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 5}), RegionColour::Other);
+    QCOMPARE(RegionMap::dominantColour(picture, {0, 9, 100, 100}), RegionColour::Green);
+    QCOMPARE(RegionMap::dominantColour(picture, {10, 10, 5, 5}), RegionColour::None);
+    QCOMPARE(RegionMap::dominantColour(QImage(), {0, 0, 10, 10}), RegionColour::None);
+    picture.fill(qRgb(0, 127, 0));
+    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 10}), RegionColour::Other);
+    picture.fill(qRgb(255, 0, 0));
+    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 10}), RegionColour::Red);
+    picture.fill(Qt::white);
+    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 10}), RegionColour::White);
+}
+
+QTEST_MAIN(ScreenTest)
+#include "ScreenTest.moc"

@@ -1,0 +1,19 @@
+# SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+# SPDX-License-Identifier: MIT
+
+add_library(DeviceTestSupport STATIC support/DeviceUnderTest.cpp support/DeviceUnderTest.h)
+target_link_libraries(DeviceTestSupport PUBLIC ProjectOptions TestSupport VirtualDevice)
+target_precompile_headers(DeviceTestSupport REUSE_FROM TestSupport)
+
+add_executable(WindowSample virtual-device/WindowSample.cpp)
+target_link_libraries(WindowSample PRIVATE ProjectOptions TestSupport)
+target_precompile_headers(WindowSample REUSE_FROM TestSupport)
+
+immunityrig_test(ScreenTest
+  SOURCES virtual-device/ScreenTest.cpp virtual-device/SampleProgram.cpp virtual-device/SampleProgram.h
+  LIBRARIES VirtualDevice LABELS unit)
+add_dependencies(ScreenTest WindowSample)
+immunityrig_test(RegistryTest SOURCES virtual-device/RegistryTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(ControlServerTest
+  SOURCES virtual-device/ControlServerTest.cpp virtual-device/ControlBench.cpp virtual-device/ControlBench.h
+  LIBRARIES VirtualDevice LABELS unit)

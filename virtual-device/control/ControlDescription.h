@@ -1,0 +1,34 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#pragma once
+
+#include "virtual-device/registry/ControlSpec.h"
+
+#include <QJsonObject>
+#include <QString>
+
+namespace VirtualDevice
+{
+
+/// The control table as people and machines read it.
+class ControlDescription
+{
+public:
+    ControlDescription() = delete;
+
+    /// One row without its value: name, type, unit, access, default, allowed, help, and minimum and maximum of a number
+    /// or choices of a choice.
+    [[nodiscard]] static QJsonObject object(const ControlSpec& spec);
+
+    /// The whole table as the page docs/controls.md, as the list of a manual page (mdoc), and as plain text.
+    [[nodiscard]] static QString markdown();
+    [[nodiscard]] static QString manual();
+    [[nodiscard]] static QString text();
+
+    /// `virtual-device controls [--markdown|--man|--json]`; `arguments` begin behind the word "controls". Returns the
+    /// exit status.
+    [[nodiscard]] static int run(const QStringList& arguments);
+};
+
+} // namespace VirtualDevice
