@@ -1,0 +1,399 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "Domain/src/DomainLayer/SerialProtocol.h"
+
+#include "Domain/src/DomainLayer/SerialPort.h"
+#include "tests/Domain/Frames.h"
+#include "tests/Domain/Pty.h"
+#include "tests/support/LogCapture.h"
+
+#include <QDir>
+#include <QFile>
+#include <QSignalSpy>
+#include <QTest>
+#include <QThread>
+
+#include <thread>
+
+using Domain::SerialPort;
+using Domain::SerialProtocol;
+using TestSupport::frameOf;
+using TestSupport::Generator;
+using TestSupport::LogCapture;
+using TestSupport::Pty;
+
+namespace
+{
+
+const QString resetFolder = "/sys/class/misc/msp430";
+const QString resetFile = "/sys/class/misc/msp430/reset";
+const QByteArray silence(200, '\0');
+
+/// A protocol on a real line, whose other end is the test.
+class Link : public QObject
+{
+public:
+    Link() : port(pty.name(), SerialPort::Baud115200), protocol(port)
+    {
+        QObject::connect(&protocol, &SerialProtocol::messageReceived, this,
+                         [this](const QByteArray& message) { messages.append(message); });
+    }
+
+    [[nodiscard]] bool receives(qsizetype count) const
+    {
+        return QTest::qWaitFor([&] { return messages.size() >= count; }, 20000);
+    }
+    /// Whatever the line has been given is parsed once a last good message has come out.
+    [[nodiscard]] bool settles()
+    {
+        pty.write(silence + frameOf("settled"));
+        const bool settled = QTest::qWaitFor([&] { return messages.contains("settled"); }, 20000);
+        messages.removeAll("settled");
+        return settled;
+    }
+
+    Pty pty;
+    SerialPort port;
+    SerialProtocol protocol;
+    QList<QByteArray> messages;
+};
+
+void makeResetFile()
+{
+    QDir().mkpath(resetFolder);
+    QFile file(resetFile);
+    QVERIFY(file.open(QIODevice::WriteOnly));
+}
+
+QByteArray resetFileContent()
+{
+    QFile file(resetFile);
+    return file.open(QIODevice::ReadOnly) ? file.readAll() : QByteArray("(none)");
+}
+
+} // namespace
+
+class SerialProtocolTest : public QObject
+{
+    Q_OBJECT
+
+private slots:
+    void init()
+    {
+        makeResetFile();
+        log = std::make_unique<LogCapture>();
+    }
+    void cleanup()
+    {
+        log.reset();
+        QFile::remove(resetFile);
+    }
+
+    void opensTheDeviceAndPulsesTheResetLineOnce();
+    void aMissingResetLineIsReportedWithItsPath();
+    void aResetLineThatCannotBeOpenedIsReported();
+    void aResetLineThatCannotBeWrittenIsReported();
+    void aDeviceThatCannotBeOpenedIsReportedAndTheResetLineStillPulsed();
+    void theDeviceStaysOpenWhenTheProtocolGoes();
+    void sentMessagesAreFramed_data();
+    void sentMessagesAreFramed();
+    void theLengthFieldOfAHugeMessageIsCutTo16Bits();
+    void aFailedSendIsReported();
+    void aFrameIsDeliveredWithoutItsWrapping();
+    void anEmptyPayloadIsDelivered();
+    void aHundredBytesAreDeliveredAHundredAndOneRefused();
+    void aSplitFrameIsDeliveredWithItsLastByte();
+    void twoFramesInOneReadArriveInOrder();
+    void noiseBeforeAFrameIsDropped();
+    void noiseWithoutAStartByteLeavesNoTraceInTheLog();
+    void refusalsAreReported_data();
+    void refusalsAreReported();
+    void aStartByteWithinARefusedFrameIsTriedNext();
+    void randomFramesAmongGarbageArriveOverTheLine();
+    void livesOnAnotherThreadThanThePort();
+    void aMessageHandlerMayParseAgain();
+
+private:
+    std::unique_ptr<LogCapture> log;
+};
+
+void SerialProtocolTest::opensTheDeviceAndPulsesTheResetLineOnce()
+{
+    const Pty pty;
+    SerialPort port(pty.name(), SerialPort::Baud115200);
+    const SerialProtocol protocol(port);
+    QVERIFY(port.isOpen());
+    QCOMPARE(port.openMode(), QIODevice::ReadWrite | QIODevice::Unbuffered);
+    QCOMPARE(resetFileContent(), QByteArray("1"));
+    QCOMPARE(log->texts(), QStringList());
+}
+
+void SerialProtocolTest::aMissingResetLineIsReportedWithItsPath()
+{
+    QVERIFY(QFile::remove(resetFile));
+    const Link link;
+    QVERIFY(log->waitFor(", Beacon processor reset line device file does not exist at/sys/class/misc/msp430/reset"));
+    QVERIFY(log->texts().front().startsWith("Domain/src/DomainLayer/SerialProtocol"));
+    QCOMPARE(log->lines().size(), std::size_t(1));
+    QVERIFY(!QFile::exists(resetFile));
+}
+
+void SerialProtocolTest::aResetLineThatCannotBeOpenedIsReported()
+{
+    QVERIFY(QFile::setPermissions(resetFile, QFile::ReadOwner));
+    const Link link;
+    QVERIFY(log->waitFor(", Cannot open beacon processor reset line device file for writing"));
+    QCOMPARE(log->lines().size(), std::size_t(1));
+}
+
+void SerialProtocolTest::aResetLineThatCannotBeWrittenIsReported()
+{
+    QVERIFY(QFile::remove(resetFile));
+    QVERIFY(QFile::link("/dev/full", resetFile));
+    const Link link;
+    QVERIFY(log->waitFor(", Cannot write to beacon processor reset line device file"));
+    QCOMPARE(log->lines().size(), std::size_t(1));
+}
+
+void SerialProtocolTest::aDeviceThatCannotBeOpenedIsReportedAndTheResetLineStillPulsed()
+{
+    SerialPort port("/dev/ttyS1", SerialPort::Baud115200);
+    SerialProtocol protocol(port);
+    QVERIFY(log->waitFor(", Unable to open beacon serial port"));
+    QCOMPARE(resetFileContent(), QByteArray("1"));
+    QVERIFY(!protocol.sendMessage("x"));
+    QVERIFY(log->waitFor(", Unable to send serial packet"));
+}
+
+void SerialProtocolTest::theDeviceStaysOpenWhenTheProtocolGoes()
+{
+    const Pty pty;
+    SerialPort port(pty.name(), SerialPort::Baud115200);
+    std::make_unique<SerialProtocol>(port).reset();
+    QVERIFY(port.isOpen());
+    pty.write("x");
+    QTRY_COMPARE(port.bytesAvailable(), qint64(1));
+}
+
+void SerialProtocolTest::sentMessagesAreFramed_data()
+{
+    QTest::addColumn<QByteArray>("payload");
+    QTest::addColumn<QByteArray>("wire");
+    QTest::addRow("empty") << QByteArray() << QByteArray::fromHex("7C 0000 0000 007C 0A");
+    QTest::addRow("ping") << QByteArray("\x7E") << QByteArray::fromHex("7C 0001 007E 00FB 7E 0A");
+    QTest::addRow("unsigned sums") << QByteArray(2, '\xFF') << QByteArray::fromHex("7C 0002 01FE 017D FFFF 0A");
+    const QByteArray longer(300, '\xFF');
+    QTest::addRow("beyond the receiver's limit")
+        << longer << QByteArray::fromHex("7C 012C 2AD4 01A7") + longer + QByteArray("\n");
+}
+
+void SerialProtocolTest::sentMessagesAreFramed()
+{
+    QFETCH(const QByteArray, payload);
+    QFETCH(const QByteArray, wire);
+    Link link;
+    QVERIFY(link.protocol.sendMessage(payload));
+    QCOMPARE(link.pty.read(wire.size()).toHex(), wire.toHex());
+}
+
+void SerialProtocolTest::theLengthFieldOfAHugeMessageIsCutTo16Bits()
+{
+    Link link;
+    QByteArray received;
+    std::atomic<bool> done = false;
+    constexpr qsizetype size = 65536 + 3;
+    std::thread peer([&] {
+        while (!done)
+            received += link.pty.read();
+    });
+    QVERIFY(link.protocol.sendMessage(QByteArray(size, '\x01')));
+    done = true;
+    peer.join();
+    // The driver may take only the beginning; what it says is what counts.
+    QCOMPARE(received.left(7).toHex(), QByteArray::fromHex("7C 0003 0003 0082").toHex());
+}
+
+void SerialProtocolTest::aFailedSendIsReported()
+{
+    Link link;
+    link.pty.hangUp();
+    QVERIFY(!link.protocol.sendMessage("x"));
+    QVERIFY(log->waitFor(", Unable to send serial packet"));
+    QVERIFY(log->waitFor(", Serial port write failed.  Error code = Input/output error"));
+}
+
+void SerialProtocolTest::aFrameIsDeliveredWithoutItsWrapping()
+{
+    Link link;
+    link.pty.write(QByteArray::fromHex("7C 0003 0069 00E8 7B 0A E4 0A"));
+    QVERIFY(link.settles());
+    QCOMPARE(link.messages, QList<QByteArray>());
+    link.pty.write(QByteArray::fromHex("7C 0003 0169 00E9 7B 0A E4 0A"));
+    QVERIFY(link.receives(1));
+    QCOMPARE(link.messages.front().toHex(), QByteArray("7b0ae4"));
+}
+
+void SerialProtocolTest::anEmptyPayloadIsDelivered()
+{
+    Link link;
+    link.pty.write(QByteArray::fromHex("7C 0000 0000 007C 0A"));
+    QVERIFY(link.receives(1));
+    QCOMPARE(link.messages, QList<QByteArray>{QByteArray()});
+    QCOMPARE(log->texts(), QStringList());
+}
+
+void SerialProtocolTest::aHundredBytesAreDeliveredAHundredAndOneRefused()
+{
+    Link link;
+    const QByteArray longest(100, 'y');
+    link.pty.write(frameOf(QByteArray(101, 'x')) + frameOf(longest));
+    QVERIFY(link.receives(1));
+    QCOMPARE(link.messages, QList<QByteArray>{longest});
+    QVERIFY(log->waitFor(", Received too large of a payload length"));
+    QCOMPARE(log->lines().size(), std::size_t(1));
+}
+
+void SerialProtocolTest::aSplitFrameIsDeliveredWithItsLastByte()
+{
+    Link link;
+    const QByteArray frame = frameOf("split");
+    for (qsizetype index = 0; index + 1 < frame.size(); ++index) {
+        link.pty.write(frame.mid(index, 1));
+        QTRY_COMPARE(link.pty.waiting(), 0);
+        QTRY_COMPARE(link.port.bytesAvailable(), qint64(0));
+    }
+    QCOMPARE(link.messages, QList<QByteArray>());
+    link.pty.write(frame.right(1));
+    QVERIFY(link.receives(1));
+    QCOMPARE(link.messages, QList<QByteArray>{"split"});
+}
+
+void SerialProtocolTest::twoFramesInOneReadArriveInOrder()
+{
+    Link link;
+    link.pty.write(frameOf("one") + frameOf("two"));
+    QVERIFY(link.receives(2));
+    QCOMPARE(link.messages, (QList<QByteArray>{"one", "two"}));
+}
+
+void SerialProtocolTest::noiseBeforeAFrameIsDropped()
+{
+    Link link;
+    link.pty.write("noise" + frameOf("good"));
+    QVERIFY(link.receives(1));
+    QCOMPARE(link.messages, QList<QByteArray>{"good"});
+    QCOMPARE(log->texts(), QStringList());
+}
+
+void SerialProtocolTest::noiseWithoutAStartByteLeavesNoTraceInTheLog()
+{
+    Link link;
+    link.pty.write(QByteArray(5000, '\n'));
+    QVERIFY(link.settles());
+    QCOMPARE(link.messages, QList<QByteArray>());
+    QCOMPARE(log->texts(), QStringList());
+}
+
+void SerialProtocolTest::refusalsAreReported_data()
+{
+    QTest::addColumn<QByteArray>("frame");
+    QTest::addColumn<QString>("text");
+    QByteArray header = frameOf("x");
+    header[6] = static_cast<char>(header[6] + 1);
+    QTest::addRow("header checksum, low byte") << header << "Received invalid header checksum";
+    header = frameOf("x");
+    header[5] = static_cast<char>(header[5] + 1);
+    QTest::addRow("header checksum, high byte") << header << "Received invalid header checksum";
+    QTest::addRow("length 101") << frameOf(QByteArray(101, '\0')) << "Received too large of a payload length";
+    QTest::addRow("length 65535") << frameOf("", 65535, 0) << "Received too large of a payload length";
+    QTest::addRow("data checksum, low byte") << frameOf("x", 1, 'x' + 1) << "Received invalid data checksum";
+    QTest::addRow("data checksum, high byte") << frameOf("x", 1, 'x' + 256) << "Received invalid data checksum";
+    QTest::addRow("end byte") << frameOf("x", 1, 'x', '\r') << "Did not receive end-of-packet byte";
+    QTest::addRow("end byte, no payload") << frameOf("", 0, 0, 'x') << "Did not receive end-of-packet byte";
+}
+
+void SerialProtocolTest::refusalsAreReported()
+{
+    QFETCH(const QByteArray, frame);
+    QFETCH(const QString, text);
+    Link link;
+    link.pty.write(frame);
+    QVERIFY(link.settles());
+    QCOMPARE(link.messages, QList<QByteArray>());
+    QVERIFY(log->waitFor(", " + text));
+    QVERIFY(log->texts().front().startsWith("Domain/src/DomainLayer/SerialProtocol"));
+    QCOMPARE(log->count(", " + text), 1);
+}
+
+void SerialProtocolTest::aStartByteWithinARefusedFrameIsTriedNext()
+{
+    Link link;
+    // A damaged frame whose payload is an intact one.
+    link.pty.write(frameOf("<" + frameOf("inner") + ">", 15, 0));
+    QVERIFY(link.receives(1));
+    QVERIFY(link.settles());
+    QCOMPARE(link.messages, QList<QByteArray>{"inner"});
+    QVERIFY(log->waitFor(", Received invalid data checksum"));
+    QCOMPARE(log->lines().size(), std::size_t(1));
+}
+
+void SerialProtocolTest::randomFramesAmongGarbageArriveOverTheLine()
+{
+    Generator generator(31);
+    const auto payloads = TestSupport::randomPayloads(generator, 500);
+    QByteArray stream;
+    for (const auto& payload : payloads)
+        stream += TestSupport::randomBytes(generator, TestSupport::randomBetween(generator, 0, 40)) + frameOf(payload);
+    Link link;
+    std::thread peer([&] {
+        for (const auto& piece : TestSupport::randomPieces(generator, stream + silence, 150))
+            link.pty.write(piece);
+    });
+    const bool complete = link.receives(payloads.size());
+    peer.join();
+    QVERIFY(complete);
+    QVERIFY(link.messages == payloads);
+}
+
+void SerialProtocolTest::livesOnAnotherThreadThanThePort()
+{
+    const Pty pty;
+    SerialPort port(pty.name(), SerialPort::Baud115200);
+    QThread worker;
+    QObject inhabitant;
+    inhabitant.moveToThread(&worker);
+    worker.start();
+    std::unique_ptr<SerialProtocol> protocol;
+    std::atomic<QThread*> deliveredOn = nullptr;
+    QMetaObject::invokeMethod(
+        &inhabitant,
+        [&] {
+            protocol = std::make_unique<SerialProtocol>(port);
+            connect(
+                protocol.get(), &SerialProtocol::messageReceived, protocol.get(),
+                [&] { deliveredOn = QThread::currentThread(); }, Qt::DirectConnection);
+        },
+        Qt::BlockingQueuedConnection);
+    QVERIFY(protocol->sendMessage("from the caller's thread"));
+    QCOMPARE(TestSupport::payloadOf(pty.read(32)), QByteArray("from the caller's thread"));
+    pty.write(frameOf("x"));
+    QTRY_COMPARE(deliveredOn.load(), &worker);
+    QMetaObject::invokeMethod(
+        &inhabitant, [&] { protocol.reset(); }, Qt::BlockingQueuedConnection);
+    worker.quit();
+    QVERIFY(worker.wait());
+}
+
+void SerialProtocolTest::aMessageHandlerMayParseAgain()
+{
+    Link link;
+    connect(&link.protocol, &SerialProtocol::messageReceived, this, [&] { link.protocol.processData(); });
+    link.pty.write(frameOf("one") + frameOf("two") + frameOf("three"));
+    QVERIFY(link.receives(3));
+    QVERIFY(link.settles());
+    QCOMPARE(link.messages, (QList<QByteArray>{"one", "two", "three"}));
+}
+
+QTEST_GUILESS_MAIN(SerialProtocolTest)
+#include "SerialProtocolTest.moc"
