@@ -3,6 +3,8 @@
 
 #include "presentation/TestGui.h"
 
+#include "DataSource/src/AbstractDataSourceLayer.h"
+#include "Domain/src/DomainLayer/Buttons.h"
 #include "presentation/ButtonsTest.h"
 #include "presentation/FuelGuageTest.h"
 #include "presentation/RtcTest.h"
@@ -30,13 +32,15 @@ void place(QWidget& test, const QWidget* region)
 /// The order of the members is the order of construction; they go in the reverse order, the screen last.
 struct TestGui::PrivateData
 {
-    PrivateData(TestGui& testGui, QWidget* parent);
+    PrivateData(TestGui& testGui, DataSource::AbstractDataSourceLayer& layer, QWidget* parent);
 
     void startTests();
 
     TestGui& owner;
     QWidget screen;
     Ui_TestGui ui{};
+    DataSource::AbstractDataSourceLayer& dataSourceLayer;
+    Domain::Buttons buttons;
     RtcTest rtcTest;
     ButtonsTest buttonsTest;
     UsbDeviceTest usbDeviceTest;
@@ -46,9 +50,11 @@ struct TestGui::PrivateData
     SdCardTest sdCardTest;
 };
 
-TestGui::PrivateData::PrivateData(TestGui& testGui, QWidget* parent)
+TestGui::PrivateData::PrivateData(TestGui& testGui, DataSource::AbstractDataSourceLayer& layer, QWidget* parent)
     : owner(testGui),
       screen(parent),
+      dataSourceLayer(layer),
+      buttons(dataSourceLayer.configurationData()),
       rtcTest(&screen),
       buttonsTest(&screen),
       usbDeviceTest(&screen),
@@ -80,7 +86,10 @@ void TestGui::PrivateData::startTests()
     sdCardTest.start();
 }
 
-TestGui::TestGui(QWidget* parent) : d(std::make_unique<PrivateData>(*this, parent)) {}
+TestGui::TestGui(DataSource::AbstractDataSourceLayer& dataSourceLayer, QWidget* parent)
+    : d(std::make_unique<PrivateData>(*this, dataSourceLayer, parent))
+{
+}
 
 TestGui::~TestGui() = default;
 

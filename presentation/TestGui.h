@@ -9,6 +9,11 @@
 
 class QWidget;
 
+namespace DataSource
+{
+class AbstractDataSourceLayer;
+}
+
 namespace Presentation
 {
 
@@ -22,7 +27,8 @@ class TestGui : public QObject
     Q_OBJECT
 
 public:
-    explicit TestGui(QWidget* parent = nullptr);
+    /// `dataSourceLayer` holds the settings of the devices and outlives the window.
+    explicit TestGui(DataSource::AbstractDataSourceLayer& dataSourceLayer, QWidget* parent = nullptr);
     ~TestGui() override;
 
     void show();

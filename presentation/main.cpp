@@ -1,6 +1,7 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
+#include "DataSource/src/DataSourceLayer.h"
 #include "presentation/TerminationSignals.h"
 #include "presentation/TestGui.h"
 #include "utilities/Debug.h"
@@ -30,7 +31,8 @@ void run(int argc, char** argv)
     // A closed window does not end the run: the log's fatal messages and the termination signals do.
     QApplication::setQuitOnLastWindowClosed(false);
     const Presentation::TerminationSignals terminationSignals;
-    Presentation::TestGui testGui;
+    DataSource::DataSourceLayer dataSourceLayer(QStringLiteral("/"));
+    Presentation::TestGui testGui(dataSourceLayer);
     testGui.show();
     QApplication::exec();
     Utilities::Debug::close();
