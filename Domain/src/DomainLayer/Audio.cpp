@@ -1,0 +1,268 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "Domain/src/DomainLayer/Audio.h"
+
+#include "DataSource/src/AbstractConfigurationData.h"
+#include "Domain/src/DomainLayer/AudioFeed.h"
+#include "Domain/src/DomainLayer/PlayRequests.h"
+#include "utilities/Debug.h"
+
+#include <QFile>
+#include <QThread>
+
+#include <SDL.h>
+#include <alsa/asoundlib.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <mutex>
+
+namespace Domain
+{
+
+namespace
+{
+
+using DataSource::AbstractConfigurationData;
+
+/// Line numbers that monitoring matches in the log.
+constexpr int initialisationFailedLine = 74;
+constexpr int openFailedLine = 91;
+constexpr int volumeTooLowLine = 109;
+constexpr int volumeTooHighLine = 116;
+constexpr int unreadableSoundLine = 270;
+constexpr int unloadableSoundLine = 285;
+
+constexpr int minimumVolume = 0;
+constexpr int maximumVolume = 6;
+constexpr int defaultVolume = 3;
+constexpr int mixerLevelsPerStep = 10;
+
+constexpr int sampleRate = 16000;
+constexpr Uint16 samplesPerBuffer = 4096;
+
+void warn(int line, const QString& text)
+{
+    Utilities::Debug::warningMessage(__FILE__, line, text);
+}
+
+/// Keeps SDL's audio callback out. Without an open device there is no callback, and this locks nothing.
+class CallbackLock
+{
+public:
+    CallbackLock() { SDL_LockAudio(); }
+    ~CallbackLock() { SDL_UnlockAudio(); }
+    Q_DISABLE_COPY_MOVE(CallbackLock)
+};
+
+void writeMixerLevel(snd_hctl_t* control, int level)
+{
+    if (snd_hctl_load(control) < 0)
+        return;
+    snd_hctl_elem_t* const volume = snd_hctl_last_elem(control);
+    if (volume == nullptr)
+        return;
+    snd_ctl_elem_value_t* value = nullptr;
+    snd_ctl_elem_value_alloca(&value);
+    snd_ctl_elem_value_set_integer(value, 0, level);
+    snd_ctl_elem_value_set_integer(value, 1, level);
+    snd_hctl_elem_write(volume, value);
+}
+
+/// A stream on a regular file; none for anything else. A pipe that has taken a file's place would keep the thread for
+/// ever.
+SDL_RWops* openedSound(const QByteArray& fileName)
+{
+    const int descriptor = ::open(fileName.constData(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    struct stat status
+    {
+    };
+    if (descriptor >= 0 && ::fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode)) {
+        if (std::FILE* const stream = ::fdopen(descriptor, "rb"))
+            return SDL_RWFromFP(stream, 1);
+    }
+    if (descriptor >= 0)
+        ::close(descriptor);
+    return nullptr;
+}
+
+struct LoadedSound
+{
+    SDL_AudioSpec spec{};
+    Uint8* buffer = nullptr;
+    Uint32 length = 0;
+};
+
+/// Without a buffer when the file cannot be loaded. SDL leaves its results alone on failure and closes the stream.
+LoadedSound loadedSound(const QString& fileName)
+{
+    LoadedSound sound;
+    SDL_RWops* const stream = openedSound(QFile::encodeName(fileName));
+    if (stream == nullptr || SDL_LoadWAV_RW(stream, 1, &sound.spec, &sound.buffer, &sound.length) == nullptr)
+        return {};
+    return sound;
+}
+
+} // namespace
+
+class Audio::PrivateData
+{
+public:
+    explicit PrivateData(AbstractConfigurationData& settings) : configuration(settings) {}
+
+    void openDevice();
+    void setDeviceVolume(int volume) const;
+    void setSound(const LoadedSound& sound);
+
+    AbstractConfigurationData& configuration;
+    bool initialised = false;
+    SDL_AudioSpec spec{};
+    Uint8* soundBuffer = nullptr;
+    AudioFeed feed;
+    /// Held by all who change the sound, outside the callback lock, which guards nothing while no device is open.
+    std::mutex mutex;
+    PlayRequests requests;
+    QThread thread;
+};
+
+void Audio::PrivateData::openDevice()
+{
+    // SDL's parachute would catch the process's crash signals.
+    initialised = SDL_Init(SDL_INIT_AUDIO | SDL_INIT_NOPARACHUTE) >= 0;
+    if (!initialised) {
+        warn(initialisationFailedLine, QStringLiteral("Unable to initialize SDL"));
+        return;
+    }
+    spec.freq = sampleRate;
+    spec.format = AUDIO_S16LSB;
+    spec.channels = 1;
+    spec.samples = samplesPerBuffer;
+    spec.callback = audioFeed;
+    spec.userdata = &feed;
+    if (SDL_OpenAudio(&spec, nullptr) < 0)
+        warn(openFailedLine, QStringLiteral("Unable to open audio"));
+}
+
+void Audio::PrivateData::setDeviceVolume(int volume) const
+{
+    if (volume < minimumVolume)
+        warn(volumeTooLowLine, QStringLiteral("Volume less than min of %1. Got %2").arg(minimumVolume).arg(volume));
+    if (volume > maximumVolume)
+        warn(volumeTooHighLine, QStringLiteral("Volume greater than max of %1. Got %2").arg(maximumVolume).arg(volume));
+    const int level = std::clamp(volume, minimumVolume, maximumVolume) * mixerLevelsPerStep;
+    // A failed open leaves no handle, and every further call on it would end the process.
+    snd_hctl_t* control = nullptr;
+    if (snd_hctl_open(&control, "default", 0) < 0)
+        return;
+    writeMixerLevel(control, level);
+    snd_hctl_close(control);
+}
+
+/// Puts a sound, or none, in place of the present one. The caller holds the mutex.
+void Audio::PrivateData::setSound(const LoadedSound& sound)
+{
+    Uint8* previous = nullptr;
+    {
+        const CallbackLock lock;
+        previous = std::exchange(soundBuffer, sound.buffer);
+        feed = {sound.length, sound.buffer};
+    }
+    SDL_FreeWAV(previous);
+}
+
+Audio::Audio(AbstractConfigurationData& configuration) : d(std::make_unique<PrivateData>(configuration))
+{
+    d->openDevice();
+    moveToThread(&d->thread);
+    d->thread.start();
+    d->setDeviceVolume(volume());
+    connect(this, &Audio::audioSet, this, &Audio::playAudio);
+}
+
+Audio::~Audio()
+{
+    // The thread may be loading a sound; what it has not begun to load is dropped with its event loop.
+    disconnect(this, &Audio::audioSet, this, &Audio::playAudio);
+    d->thread.quit();
+    d->thread.wait();
+    Audio::stop();
+    SDL_CloseAudio();
+    if (d->initialised)
+        SDL_Quit();
+}
+
+void Audio::play(QIODevice* sound)
+{
+    d->requests.add(sound);
+    emit audioSet(sound);
+}
+
+void Audio::playAudio(QIODevice* sound)
+{
+    const auto state = d->requests.take(sound);
+    if (state == PlayRequests::State::Answered)
+        return;
+    auto* const file = state == PlayRequests::State::Gone ? nullptr : dynamic_cast<QFile*>(sound);
+    if (file == nullptr || !file->isReadable()) {
+        warn(unreadableSoundLine, QStringLiteral("Attempt to play sound in unreadable file."));
+        return;
+    }
+    file->reset();
+    stop();
+    const QString fileName = file->fileName();
+    // Outside the locks: a slow card must not hold up whoever pauses or stops meanwhile.
+    const LoadedSound loaded = loadedSound(fileName);
+    const std::lock_guard lock(d->mutex);
+    d->setSound(loaded);
+    if (loaded.buffer == nullptr) {
+        warn(unloadableSoundLine,
+             QStringLiteral("Unable to open sound file %1").arg(Utilities::Debug::literal(fileName)));
+        return;
+    }
+    d->spec = loaded.spec;
+    SDL_PauseAudio(0);
+    d->requests.answer(sound);
+}
+
+void Audio::pause()
+{
+    SDL_PauseAudio(1);
+}
+
+void Audio::resume()
+{
+    SDL_PauseAudio(0);
+}
+
+void Audio::stop()
+{
+    const std::lock_guard lock(d->mutex);
+    SDL_PauseAudio(1);
+    d->setSound({});
+}
+
+bool Audio::isPlaying() const
+{
+    return SDL_GetAudioStatus() == SDL_AUDIO_PLAYING;
+}
+
+int Audio::volume()
+{
+    return d->configuration.data(AbstractConfigurationData::Volume, defaultVolume).toInt();
+}
+
+void Audio::setVolume(int volume)
+{
+    d->setDeviceVolume(volume);
+    // The value read from the file is a string.
+    const QVariant stored = d->configuration.data(AbstractConfigurationData::Volume);
+    bool isNumber = false;
+    if (stored.toInt(&isNumber) != volume || !isNumber)
+        d->configuration.setData(AbstractConfigurationData::Volume, volume);
+}
+
+} // namespace Domain
