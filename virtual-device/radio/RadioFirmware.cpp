@@ -6,6 +6,7 @@
 #include "virtual-device/registry/Registry.h"
 
 #include <QRegularExpression>
+#include <QTimer>
 
 #include <utility>
 
@@ -55,8 +56,7 @@ const std::array<RadioFirmware::Action, commandShapes.size()> RadioFirmware::act
 RadioFirmware::RadioFirmware(Registry& controls, QObject* parent)
     : QObject(parent), registry(controls), accelTimer(this)
 {
-    accelTimer.setTimerType(Qt::PreciseTimer);
-    connect(&accelTimer, &QTimer::timeout, this, &RadioFirmware::sendAccelFrame);
+    connect(&accelTimer, &RateTimer::due, this, &RadioFirmware::sendAccelFrame);
     connect(&registry, &Registry::changed, this, &RadioFirmware::controlChanged);
     adoptVersion();
     adoptAccelRate();
@@ -316,11 +316,7 @@ void RadioFirmware::adoptVersion()
 
 void RadioFirmware::adoptAccelRate()
 {
-    const auto rate = registry.integer(QStringLiteral("radio.accel_rate"));
-    if (rate > 0)
-        accelTimer.start(std::chrono::milliseconds(std::max<qint64>(1, 1000 / rate)));
-    else
-        accelTimer.stop();
+    accelTimer.setRate(registry.integer(QStringLiteral("radio.accel_rate")));
 }
 
 void RadioFirmware::sendAccelFrame()

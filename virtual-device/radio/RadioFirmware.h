@@ -3,12 +3,12 @@
 
 #pragma once
 
+#include "virtual-device/device/RateTimer.h"
 #include "virtual-device/radio/RadioProtocol.h"
 
 #include <QByteArray>
 #include <QList>
 #include <QObject>
-#include <QTimer>
 
 #include <array>
 
@@ -87,7 +87,7 @@ private:
     QList<QByteArray> replies; ///< to follow the acknowledgement of the command that is being carried out
     QList<QByteArray> waiting; ///< for the program to listen
     QByteArray version;
-    QTimer accelTimer;
+    RateTimer accelTimer;
     quint16 accelFrame = 0;
 };
 
