@@ -25,7 +25,12 @@ const QString stalledControl = QStringLiteral("log.stalled");
 } // namespace
 
 Device::Device(DeviceOptions choices, QObject* parent)
-    : QObject(parent), options(std::move(choices)), radio(values), deviceTree(values), dataPartition(values)
+    : QObject(parent),
+      options(std::move(choices)),
+      radio(values),
+      dsp(values),
+      deviceTree(values),
+      dataPartition(values)
 {
     connect(&values, &Registry::changed, &logStore, [this](const QString& name, const QJsonValue& value) {
         if (name == stalledControl)
@@ -82,6 +87,8 @@ std::optional<QString> Device::makeFiles()
     const QString card = deviceFolder.path(QStringLiteral("card"));
     if (auto problem = dataPartition.mount(stateFolder() + QStringLiteral("/mnt/data"), card))
         return problem;
+    if (auto problem = dsp.open(deviceFolder.path(QStringLiteral("dsplink"))))
+        return problem;
     return logStore.open(deviceFolder.path(QStringLiteral("log")));
 }
 
@@ -129,6 +136,8 @@ void Device::addModels(SandboxPlan& plan) const
 {
     if (values.text(QStringLiteral("radio.presence")) == u"present" && !radio.devicePath().isEmpty())
         plan.add(radio.devicePath(), QStringLiteral("/dev/ttyS1"), Kind::Device);
+    if (values.text(QStringLiteral("dsp.presence")) != u"missing")
+        plan.add(deviceFolder.path(QStringLiteral("dsplink")), QStringLiteral("/dev/dsplink"), Kind::Writable);
 }
 
 void Device::addScreen(SandboxPlan& plan) const
@@ -172,6 +181,7 @@ void Device::watchForWindow()
 void Device::tearDown()
 {
     sandbox.kill();
+    dsp.close();
     logStore.close();
     dataPartition.unmount();
     deviceTree.unmount();

@@ -3,6 +3,7 @@
 
 #pragma once
 
+#include "virtual-device/dsp/DspModel.h"
 #include "virtual-device/log/LogStore.h"
 #include "virtual-device/radio/RadioModel.h"
 #include "virtual-device/registry/Registry.h"
@@ -84,6 +85,7 @@ private:
     Registry values;
     LogStore logStore;
     RadioModel radio;
+    DspModel dsp;
     DeviceTree deviceTree;
     DataPartition dataPartition;
     VncRelay relay;

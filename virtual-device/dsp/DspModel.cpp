@@ -22,6 +22,11 @@ QByteArray name(std::string_view text)
     return {text.data(), static_cast<qsizetype>(text.size())};
 }
 
+bool isAnswer(quint32 type)
+{
+    return type == static_cast<quint32>(MessageType::Ack) || type == static_cast<quint32>(MessageType::Nak);
+}
+
 } // namespace
 
 const std::array<DspModel::Rule, 10> DspModel::rules{{
@@ -122,7 +127,7 @@ void DspModel::request(const DspPacket& packet)
 
 void DspModel::reply(const DspPacket& request, Status status, quint32 value)
 {
-    socket.send(DspPacket::reply(request.serial, status, value));
+    socket.send(DspPacket::reply(request.serial, status, value), DspSocket::Urgency::Answer);
 }
 
 void DspModel::message(const DspPacket& packet)
@@ -265,8 +270,9 @@ void DspModel::sendData(const QByteArray& data, quint16 messageId)
     const auto queue = queues.constFind(name(armQueueName));
     if (queue == queues.constEnd() || state < State::Started)
         return;
-    const bool sent =
-        socket.send(DspPacket::message(*queue, messageId, data.first(std::min(data.size(), longestData))));
+    const auto urgency = isAnswer(dspWord(data, 0)) ? DspSocket::Urgency::Answer : DspSocket::Urgency::Data;
+    const QByteArray packet = DspPacket::message(*queue, messageId, data.first(std::min(data.size(), longestData)));
+    const bool sent = socket.send(packet, urgency);
     registry.count(sent ? QStringLiteral("dsp.messages_sent") : QStringLiteral("dsp.messages_lost"));
 }
 
