@@ -14,3 +14,12 @@ foreach(test IN ITEMS
     RfTestTest RfLinkTest)
   immunityrig_test(${test} SOURCES presentation/${test}.cpp LIBRARIES PresentationTestSupport Presentation LABELS presentation)
 endforeach()
+immunityrig_test(TestGuiTest SOURCES presentation/TestGuiTest.cpp
+  LIBRARIES PresentationTestSupport Presentation LABELS presentation)
+immunityrig_test(ResourcesTest
+  SOURCES presentation/ResourcesTest.cpp "${PROJECT_SOURCE_DIR}/resources/Target.qrc"
+    "${PROJECT_SOURCE_DIR}/resources/Resources.qrc"
+  LABELS presentation)
+immunityrig_test(ProgramTest SOURCES presentation/ProgramTest.cpp
+  LIBRARIES PresentationTestSupport LABELS presentation)
+add_dependencies(ProgramTest immunityrig)

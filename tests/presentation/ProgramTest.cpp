@@ -1,0 +1,188 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "tests/presentation/WidgetProbe.h"
+#include "tests/support/LogCapture.h"
+
+#include <QProcess>
+#include <QTest>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <syslog.h>
+#include <unistd.h>
+
+#include <csignal>
+
+using TestSupport::LogCapture;
+using TestSupport::writeFile;
+
+namespace
+{
+
+const QString started = QStringLiteral("Starting ImmunityRig");
+const QString probeFile = QStringLiteral("/mnt/data/testfile");
+constexpr int patienceMs = 60'000;
+
+/// The program as it ships, on a device whose files the case has laid out.
+class Program : public QProcess
+{
+public:
+    Program()
+    {
+        auto environment = QProcessEnvironment::systemEnvironment();
+        environment.remove(QStringLiteral("QT_PLUGIN_PATH"));
+        environment.remove(QStringLiteral("QT_QPA_PLATFORM_PLUGIN_PATH"));
+        setProcessEnvironment(environment);
+        setProgram(qEnvironmentVariable("IMMUNITYRIG_BUILD") + QStringLiteral("/presentation/immunityrig"));
+    }
+
+    ~Program() override
+    {
+        kill();
+        waitForFinished();
+    }
+
+    void signal(int number) const { ::kill(static_cast<pid_t>(processId()), number); }
+
+    /// Whether it is set to handle the signal itself. Asked once it has logged something: before, it is still a fork of
+    /// the test, with the test's handlers.
+    [[nodiscard]] bool catches(int number) const
+    {
+        QFile status(QStringLiteral("/proc/%1/status").arg(processId()));
+        if (!status.open(QIODevice::ReadOnly))
+            return false;
+        const auto lines = status.readAll().split('\n');
+        for (const auto& line : lines) {
+            if (line.startsWith("SigCgt:"))
+                return ((line.mid(7).trimmed().toULongLong(nullptr, 16) >> (number - 1)) & 1U) != 0;
+        }
+        return false;
+    }
+};
+
+/// The card's check ran again: it wrote the probe file that has just been removed.
+bool pollsAgain()
+{
+    QFile::remove(probeFile);
+    return QTest::qWaitFor([] { return QFile::exists(probeFile); }, patienceMs);
+}
+
+} // namespace
+
+class ProgramTest : public QObject
+{
+    Q_OBJECT
+
+private slots:
+    void init()
+    {
+        QDir().mkpath(QStringLiteral("/sys/block/mmcblk0"));
+        QDir().mkpath(QStringLiteral("/mnt/data"));
+    }
+
+    void cleanup()
+    {
+        TestSupport::removePath(QStringLiteral("/sys/block"));
+        TestSupport::removePath(QStringLiteral("/sys/class"));
+        TestSupport::removePath(QStringLiteral("/mnt/data"));
+    }
+
+    /// The compiled-in configuration points Qt to a folder without plugins, and no variable says where they are.
+    void startsByItselfAndSaysSoFirst()
+    {
+        const LogCapture log;
+        Program program;
+        program.start();
+        QVERIFY(log.waitFor(started));
+        const auto first = log.lines().front();
+        QCOMPARE(first.text, started);
+        QCOMPARE(first.identity, QStringLiteral("VQK"));
+        QCOMPARE(first.priority, LOG_INFO);
+        QCOMPARE(first.facility, 1);
+        QVERIFY(pollsAgain());
+        QCOMPARE(program.state(), QProcess::Running);
+    }
+
+    void endsOrderlyOnATerminationSignal_data()
+    {
+        QTest::addColumn<int>("number");
+        QTest::newRow("SIGTERM") << SIGTERM;
+        QTest::newRow("SIGINT") << SIGINT;
+    }
+
+    void endsOrderlyOnATerminationSignal()
+    {
+        QFETCH(int, number);
+        Program program;
+        program.start();
+        QVERIFY(pollsAgain());
+        program.signal(number);
+        QVERIFY(program.waitForFinished(patienceMs));
+        QCOMPARE(program.exitStatus(), QProcess::NormalExit);
+        QCOMPARE(program.exitCode(), 0);
+    }
+
+    /// A gauge that never answers holds the event loop, which the first signal would end.
+    void aSecondSignalKillsAProgramThatHangs()
+    {
+        const QByteArray gauge("/sys/class/power_supply/ds2780-battery.0/voltage_now");
+        QDir().mkpath(QFileInfo(QString::fromLatin1(gauge)).path());
+        QCOMPARE(::mkfifo(gauge.constData(), 0644), 0);
+        const LogCapture log;
+        Program program;
+        program.start();
+        QVERIFY(log.waitFor(started));
+        QTRY_VERIFY_WITH_TIMEOUT(program.catches(SIGTERM), patienceMs);
+        program.signal(SIGTERM);
+        QTRY_VERIFY_WITH_TIMEOUT(!program.catches(SIGTERM), patienceMs);
+        QVERIFY(!program.catches(SIGINT));
+        QCOMPARE(program.state(), QProcess::Running);
+        program.signal(SIGINT);
+        QVERIFY(program.waitForFinished(patienceMs));
+        QCOMPARE(program.exitStatus(), QProcess::CrashExit);
+        QCOMPARE(program.exitCode(), SIGINT);
+    }
+
+    void aSignalDuringStartUpEndsItAsSoonAsTheWindowStands()
+    {
+        const QByteArray gauge("/sys/class/power_supply/ds2780-battery.0/voltage_now");
+        QDir().mkpath(QFileInfo(QString::fromLatin1(gauge)).path());
+        QCOMPARE(::mkfifo(gauge.constData(), 0644), 0);
+        const LogCapture log;
+        Program program;
+        program.start();
+        QVERIFY(log.waitFor(started));
+        QTRY_VERIFY_WITH_TIMEOUT(program.catches(SIGTERM), patienceMs);
+        program.signal(SIGTERM);
+        QTRY_VERIFY_WITH_TIMEOUT(!program.catches(SIGTERM), patienceMs);
+        const int writer = ::open(gauge.constData(), O_WRONLY | O_CLOEXEC);
+        ::close(writer);
+        QVERIFY(program.waitForFinished(patienceMs));
+        QCOMPARE(program.exitStatus(), QProcess::NormalExit);
+        QCOMPARE(program.exitCode(), 0);
+    }
+
+    /// Without a clock it has something to say every second.
+    void goesOnWhenNobodyReadsItsErrorsAnyMore()
+    {
+        Program program;
+        program.start();
+        QVERIFY(pollsAgain());
+        program.closeReadChannel(QProcess::StandardError);
+        for (int second = 0; second < 3; ++second)
+            QVERIFY(pollsAgain());
+        QCOMPARE(program.state(), QProcess::Running);
+    }
+
+    void goesOnWithoutALogService()
+    {
+        Program program;
+        program.start();
+        QVERIFY(pollsAgain());
+        QCOMPARE(program.state(), QProcess::Running);
+    }
+};
+
+QTEST_GUILESS_MAIN(ProgramTest)
+#include "ProgramTest.moc"
