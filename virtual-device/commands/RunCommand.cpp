@@ -3,6 +3,7 @@
 
 #include "virtual-device/commands/Commands.h"
 #include "virtual-device/commands/DeviceSession.h"
+#include "virtual-device/control/LiveTable.h"
 
 #include <QCommandLineParser>
 #include <QCoreApplication>
@@ -10,7 +11,10 @@
 #include <QFileInfo>
 #include <QTextStream>
 
+#include <unistd.h>
+
 #include <algorithm>
+#include <optional>
 
 namespace VirtualDevice
 {
@@ -69,7 +73,12 @@ int runCommand(const QStringList& arguments)
     if (const auto problem = chooseProgram(parser, options))
         return DeviceSession::complain(*problem, ExitStatus::failure);
     DeviceSession session(options);
-    QObject::connect(&session.device(), &Device::ready, [&] { announce(session.device()); });
+    std::optional<LiveTable> table;
+    QObject::connect(&session.device(), &Device::ready, [&] {
+        announce(session.device());
+        if (::isatty(STDOUT_FILENO) != 0)
+            table.emplace(session.device().regions(), STDOUT_FILENO);
+    });
     QObject::connect(&session.device(), &Device::ended, [&](int status) {
         if (status != 0 && !session.isAskedToEnd())
             explainEnd(session.device().program(), status);

@@ -19,7 +19,13 @@ ControlServer::ControlServer(const ControlContext& reached, QObject* parent) : Q
 
 ControlServer::~ControlServer()
 {
+    close();
+}
+
+void ControlServer::close()
+{
     server.close();
+    qDeleteAll(findChildren<ControlSession*>(Qt::FindDirectChildrenOnly));
 }
 
 std::optional<QString> ControlServer::listen(const QString& path)

@@ -7,8 +7,7 @@
 
 #include <QDir>
 #include <QFileInfo>
-#include <QLocalSocket>
-#include <QTimer>
+#include <QImage>
 
 namespace VirtualDevice
 {
@@ -21,6 +20,13 @@ using Kind = SandboxBind::Kind;
 /// Where the sandbox sees the folder of sockets that it shares with us.
 const QString sharedFolder = QStringLiteral("/run/virtual-device");
 const QString stalledControl = QStringLiteral("log.stalled");
+
+bool isBlack(const QImage& picture)
+{
+    QImage empty(picture.size(), picture.format());
+    empty.fill(Qt::black);
+    return picture == empty;
+}
 
 } // namespace
 
@@ -38,6 +44,7 @@ Device::Device(DeviceOptions choices, QObject* parent)
     });
     // Direct: the pulse counts before the first byte that the program sends after it.
     connect(&deviceTree, &DeviceTree::resetLineWritten, &radio, &RadioModel::reset, Qt::DirectConnection);
+    watchModels();
     connect(&sandbox, &Sandbox::ended, this, [this](int status) {
         tearDown();
         emit ended(status);
@@ -89,7 +96,9 @@ std::optional<QString> Device::makeFiles()
         return problem;
     if (auto problem = dsp.open(deviceFolder.path(QStringLiteral("dsplink"))))
         return problem;
-    return logStore.open(deviceFolder.path(QStringLiteral("log")));
+    if (auto problem = logStore.open(deviceFolder.path(QStringLiteral("log"))))
+        return problem;
+    return controlServer.listen(controlSocket());
 }
 
 std::optional<QString> Device::startSandbox()
@@ -157,24 +166,26 @@ void Device::addOwnCommand(SandboxPlan& plan) const
     plan.binds.append({controlSocket(), control, Kind::Writable, true});
 }
 
-/// The program's server greets whoever connects, once it has made its screen; until then the relay hangs up.
+/// The program paints its window after the server has shown an empty screen, which is black.
 void Device::watchForWindow()
 {
-    constexpr int pause = 50; // ms
-    auto* greeting = new QLocalSocket(&sandbox);
-    connect(greeting, &QLocalSocket::readyRead, this, [this, greeting] {
-        greeting->disconnect(this);
-        greeting->deleteLater();
+    screen.open(vncSocket());
+    auto* waiting = new QObject(this);
+    connect(&screen, &Screen::updated, waiting, [this, waiting] {
+        if (isBlack(screen.picture()))
+            return;
+        waiting->deleteLater();
+        disconnect(&screen, nullptr, waiting, nullptr);
         emit ready();
     });
-    const auto again = [this, greeting] {
-        greeting->deleteLater();
-        if (sandbox.isRunning())
-            QTimer::singleShot(pause, this, &Device::watchForWindow);
-    };
-    connect(greeting, &QLocalSocket::disconnected, this, again);
-    connect(greeting, &QLocalSocket::errorOccurred, this, again);
-    greeting->connectToServer(vncSocket());
+}
+
+/// What the models see goes to whoever listens on the control socket.
+void Device::watchModels()
+{
+    connect(&radio, &RadioModel::violated, &monitor, [this](const QString& what) {
+        monitor.raise(QStringLiteral("radio"), QStringLiteral("violation"), {{QStringLiteral("what"), what}});
+    });
 }
 
 /// In the opposite order: nobody may use a file system when it goes.

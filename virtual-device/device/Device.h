@@ -3,6 +3,8 @@
 
 #pragma once
 
+#include "virtual-device/control/ControlServer.h"
+#include "virtual-device/control/Monitor.h"
 #include "virtual-device/dsp/DspModel.h"
 #include "virtual-device/log/LogStore.h"
 #include "virtual-device/radio/RadioModel.h"
@@ -10,6 +12,9 @@
 #include "virtual-device/sandbox/DeviceFolder.h"
 #include "virtual-device/sandbox/Sandbox.h"
 #include "virtual-device/sandbox/VncRelay.h"
+#include "virtual-device/screen/RegionWatch.h"
+#include "virtual-device/screen/Screen.h"
+#include "virtual-device/screen/SignalLines.h"
 #include "virtual-device/tree/DataPartition.h"
 #include "virtual-device/tree/DeviceTree.h"
 
@@ -53,6 +58,7 @@ public:
     [[nodiscard]] Registry& registry() { return values; }
     [[nodiscard]] LogStore& log() { return logStore; }
     [[nodiscard]] DeviceTree& tree() { return deviceTree; }
+    [[nodiscard]] RegionWatch& regions() { return regionWatch; }
     [[nodiscard]] Sandbox& program() { return sandbox; }
     [[nodiscard]] const DeviceFolder& folder() const { return deviceFolder; }
     /// Where a person's VNC viewer finds the screen: "127.0.0.1:PORT".
@@ -63,7 +69,7 @@ public:
     [[nodiscard]] QString stateFolder() const;
 
 signals:
-    /// The program's window stands.
+    /// The program's window stands, and its first picture is here.
     void ready();
     /// The program ended with this exit status (128 + the signal's number when one ended it).
     void ended(int status);
@@ -78,6 +84,7 @@ private:
     void addScreen(SandboxPlan& plan) const;
     void addOwnCommand(SandboxPlan& plan) const;
     void watchForWindow();
+    void watchModels();
     void tearDown();
 
     DeviceOptions options;
@@ -89,6 +96,11 @@ private:
     DeviceTree deviceTree;
     DataPartition dataPartition;
     VncRelay relay;
+    Screen screen;
+    RegionWatch regionWatch{screen};
+    SignalLines signalLines{values, screen};
+    Monitor monitor;
+    ControlServer controlServer{ControlContext{values, logStore, screen, regionWatch, monitor}};
     Sandbox sandbox;
 };
 
