@@ -5,3 +5,5 @@ immunityrig_test(SerialPortTest SOURCES Domain/SerialPortTest.cpp Domain/Pty.cpp
 immunityrig_test(FrameParserTest SOURCES Domain/FrameParserTest.cpp Domain/Frames.cpp LIBRARIES Domain LABELS unit)
 immunityrig_test(SerialProtocolTest SOURCES Domain/SerialProtocolTest.cpp Domain/Frames.cpp Domain/Pty.cpp
   LIBRARIES Domain LABELS unit)
+immunityrig_test(BeaconProcessorTest SOURCES Domain/BeaconProcessorTest.cpp Domain/Frames.cpp Domain/Pty.cpp
+  Domain/RadioPeer.cpp LIBRARIES Domain LABELS unit)
