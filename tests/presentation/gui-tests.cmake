@@ -23,3 +23,6 @@ immunityrig_test(ResourcesTest
 immunityrig_test(ProgramTest SOURCES presentation/ProgramTest.cpp
   LIBRARIES PresentationTestSupport LABELS presentation)
 add_dependencies(ProgramTest immunityrig)
+immunityrig_test(RtcOnDeviceTest ON_DEVICE SOURCES presentation/RtcOnDeviceTest.cpp
+  LIBRARIES PresentationTestSupport DeviceTestSupport Presentation LABELS presentation)
+add_dependencies(RtcOnDeviceTest virtual-device)
