@@ -163,7 +163,7 @@ void Device::addOwnCommand(SandboxPlan& plan) const
         plan.environment.insert(QStringLiteral("QT_QPA_PLATFORM"), QStringLiteral("offscreen"));
     const QString control = QStringLiteral("/run/control");
     plan.environment.insert(QStringLiteral("VIRTUAL_DEVICE_CONTROL"), control);
-    plan.binds.append({controlSocket(), control, Kind::Writable, true});
+    plan.add(controlSocket(), control, Kind::Writable);
 }
 
 /// The program paints its window after the server has shown an empty screen, which is black.

@@ -13,6 +13,7 @@
 
 #include <algorithm>
 #include <array>
+#include <utility>
 
 namespace VirtualDevice
 {
@@ -79,9 +80,11 @@ void LogStore::close()
 {
     if (descriptor < 0)
         return;
+    // What the program sent before it ended is part of its log.
+    if (!isStalled)
+        receive();
     notifier.reset();
-    ::close(descriptor);
-    descriptor = -1;
+    ::close(std::exchange(descriptor, -1));
     ::unlink(socketPath.toLocal8Bit().constData());
 }
 

@@ -94,12 +94,25 @@ QStringList knownNames()
     return names;
 }
 
+/// A folder that the program closed to itself could not be emptied.
+void openFolders(const std::filesystem::path& folder)
+{
+    using std::filesystem::perms;
+    std::error_code ignored;
+    for (std::filesystem::recursive_directory_iterator entry(folder, ignored), end; entry != end && !ignored;
+         entry.increment(ignored)) {
+        if (entry->symlink_status(ignored).type() == std::filesystem::file_type::directory)
+            std::filesystem::permissions(entry->path(), perms::owner_all, std::filesystem::perm_options::add, ignored);
+    }
+}
+
 /// Never enters a file system that is mounted below the folder: what it shows may be the operator's own state.
 void removeFolder(const QString& folder)
 {
     unmountBelow(folder);
     if (!mountedBelow(folder).isEmpty())
         return;
+    openFolders(folder.toStdString());
     std::error_code ignored;
     std::filesystem::remove_all(folder.toStdString(), ignored);
 }

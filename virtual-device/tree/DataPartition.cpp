@@ -14,7 +14,6 @@
 
 #include <cerrno>
 #include <cstring>
-#include <memory>
 
 namespace VirtualDevice
 {
@@ -48,11 +47,6 @@ bool changes(int flags)
     return (flags & O_ACCMODE) != O_RDONLY || (flags & (O_TRUNC | O_CREAT)) != 0;
 }
 
-struct FolderCloser
-{
-    void operator()(DIR* folder) const { ::closedir(folder); }
-};
-
 } // namespace
 
 /// The bridge from the library's C functions. Paths never hold a link: the kernel has followed them already.
@@ -73,7 +67,7 @@ struct PartitionOperations
     /// The kernel keeps the root of what is mounted; a failing card shows below it.
     static int getattr(const char* path, struct stat* status, fuse_file_info* info)
     {
-        const bool isRoot = std::strcmp(path, "/") == 0;
+        const bool isRoot = info == nullptr && std::strcmp(path, "/") == 0;
         return unless(isRoot ? 0 : card().failure(), [&] {
             return info != nullptr ? ::fstat(descriptorOf(info), status)
                                    : ::fstatat(root(), below(path), status, AT_SYMLINK_NOFOLLOW);
@@ -97,15 +91,31 @@ struct PartitionOperations
         return 0;
     }
 
-    static int readdir(const char* path, void* buffer, fuse_fill_dir_t fill, off_t, fuse_file_info*, fuse_readdir_flags)
+    static int opendir(const char* path, fuse_file_info* info)
     {
         if (card().failure() != 0)
             return -card().failure();
         const int descriptor = ::openat(root(), below(path), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
         if (descriptor < 0)
             return -errno;
-        const std::unique_ptr<DIR, FolderCloser> folder(::fdopendir(descriptor));
-        while (const dirent* entry = ::readdir(folder.get()))
+        info->fh = reinterpret_cast<std::uintptr_t>(::fdopendir(descriptor));
+        return 0;
+    }
+
+    static DIR* folderOf(const fuse_file_info* info) { return reinterpret_cast<DIR*>(info->fh); }
+
+    static int releasedir(const char*, fuse_file_info* info)
+    {
+        ::closedir(folderOf(info));
+        return 0;
+    }
+
+    static int readdir(const char*, void* buffer, fuse_fill_dir_t fill, off_t, fuse_file_info* info, fuse_readdir_flags)
+    {
+        if (card().failure() != 0)
+            return -card().failure();
+        ::rewinddir(folderOf(info));
+        while (const dirent* entry = ::readdir(folderOf(info)))
             fill(buffer, entry->d_name, nullptr, 0, fuse_fill_dir_flags{});
         return 0;
     }
@@ -141,9 +151,11 @@ struct PartitionOperations
         return unless(card().refusalOfGrowth(), [&] { return ::linkat(root(), below(from), root(), below(to), 0); });
     }
 
-    static int chmod(const char* path, mode_t mode, fuse_file_info*)
+    static int chmod(const char* path, mode_t mode, fuse_file_info* info)
     {
-        return unless(card().refusalOfChange(), [&] { return ::fchmodat(root(), below(path), mode, 0); });
+        return unless(card().refusalOfChange(), [&] {
+            return info != nullptr ? ::fchmod(descriptorOf(info), mode) : ::fchmodat(root(), below(path), mode, 0);
+        });
     }
 
     static int truncate(const char* path, off_t size, fuse_file_info* info)
@@ -160,10 +172,12 @@ struct PartitionOperations
         });
     }
 
-    static int utimens(const char* path, const timespec* times, fuse_file_info*)
+    static int utimens(const char* path, const timespec* times, fuse_file_info* info)
     {
-        return unless(card().refusalOfChange(),
-                      [&] { return ::utimensat(root(), below(path), times, AT_SYMLINK_NOFOLLOW); });
+        return unless(card().refusalOfChange(), [&] {
+            return info != nullptr ? ::futimens(descriptorOf(info), times)
+                                   : ::utimensat(root(), below(path), times, AT_SYMLINK_NOFOLLOW);
+        });
     }
 
     static int openWith(const char* path, fuse_file_info* info, int flags, mode_t mode)
@@ -222,6 +236,8 @@ struct PartitionOperations
         all.getattr = getattr;
         all.access = access;
         all.readlink = readlink;
+        all.opendir = opendir;
+        all.releasedir = releasedir;
         all.readdir = readdir;
         all.mkdir = mkdir;
         all.unlink = unlink;
@@ -253,7 +269,7 @@ std::optional<QString> DataPartition::mount(const QString& folder, const QString
     root = ::open(folder.toLocal8Bit().constData(), O_PATH | O_DIRECTORY | O_CLOEXEC);
     if (root < 0)
         return QStringLiteral("%1: %2").arg(folder, qt_error_string(errno));
-    return fileSystem.mount(mountPoint, PartitionOperations::table(), this);
+    return fileSystem.mount(mountPoint, PartitionOperations::table(), this, FuseMount::Names::Removable);
 }
 
 void DataPartition::unmount()

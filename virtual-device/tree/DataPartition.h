@@ -16,6 +16,9 @@ class Registry;
 /// card can turn read-only (`sd.readonly`: EROFS), run full (`sd.full`: ENOSPC) or fail (`sd.fault`) while it is in
 /// use.
 ///
+/// Not supported: `fstat` of a file that was removed while it is open (ENOENT; reading, writing and truncating it work),
+/// owners, and extended attributes.
+///
 /// Threads: as FuseMount.
 class DataPartition
 {

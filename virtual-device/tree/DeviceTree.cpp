@@ -236,7 +236,7 @@ DeviceTree::~DeviceTree()
 
 std::optional<QString> DeviceTree::mount(const QString& mountPoint)
 {
-    return fileSystem.mount(mountPoint, TreeOperations::table(), this);
+    return fileSystem.mount(mountPoint, TreeOperations::table(), this, FuseMount::Names::Permanent);
 }
 
 void DeviceTree::unmount()

@@ -19,7 +19,7 @@ namespace VirtualDevice
 namespace
 {
 
-void* configure(fuse_conn_info*, fuse_config* config)
+template <FuseMount::Names names> void* configure(fuse_conn_info*, fuse_config* config)
 {
     config->entry_timeout = 0;
     config->attr_timeout = 0;
@@ -28,6 +28,7 @@ void* configure(fuse_conn_info*, fuse_config* config)
     config->direct_io = 1;
     // A removed file goes at once, as on a disk; open handles of ours keep theirs alive.
     config->hard_remove = 1;
+    config->nullpath_ok = names == FuseMount::Names::Removable ? 1 : 0;
     return fuse_get_context()->private_data;
 }
 
@@ -50,10 +51,10 @@ FuseMount::~FuseMount()
     unmount();
 }
 
-std::optional<QString> FuseMount::mount(const QString& mountPoint, fuse_operations operations, void* owner)
+std::optional<QString> FuseMount::mount(const QString& mountPoint, fuse_operations operations, void* owner, Names names)
 {
     unmount();
-    operations.init = configure;
+    operations.init = names == Names::Removable ? configure<Names::Removable> : configure<Names::Permanent>;
     std::string program = "virtual-device";
     std::string option = "-ofsname=virtual-device";
     std::array<char*, 2> words{program.data(), option.data()};

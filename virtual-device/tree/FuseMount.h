@@ -30,8 +30,15 @@ public:
     FuseMount(const FuseMount&) = delete;
     FuseMount& operator=(const FuseMount&) = delete;
 
+    enum class Names
+    {
+        Permanent, ///< nothing can be removed: every operation is told the path
+        Removable, ///< operations on something open are told its handle alone (path null), as its name may have gone
+    };
+
     /// `owner` is what the operations find as `fuse_get_context()->private_data`. Returns what went wrong.
-    [[nodiscard]] std::optional<QString> mount(const QString& mountPoint, fuse_operations operations, void* owner);
+    [[nodiscard]] std::optional<QString> mount(const QString& mountPoint, fuse_operations operations, void* owner,
+                                               Names names);
     /// Ends the thread and detaches the mount point; whoever still holds a file of it gets errors from now on.
     void unmount();
 

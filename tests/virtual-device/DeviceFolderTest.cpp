@@ -1,0 +1,183 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "virtual-device/sandbox/DeviceFolder.h"
+
+#include <QDir>
+#include <QFile>
+#include <QTemporaryDir>
+#include <QTest>
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+using VirtualDevice::DeviceFolder;
+
+class DeviceFolderTest : public QObject
+{
+    Q_OBJECT
+
+private slots:
+    void init();
+    void cleanup();
+    void folderLiesInTheRuntimeFolderForItsOwnerAlone();
+    void runtimeFolderOfSomebodyElseIsNotUsed();
+    void unnamedDevicesTakeTheFirstFreeNumber();
+    void nameThatIsTakenIsRefused();
+    void nameCanBeTakenAgainAfterRelease();
+    void names_data();
+    void names();
+    void runningDevicesAreThoseThatHoldTheirName();
+    void cleanUpRemovesWhatAKilledDeviceLeft();
+    void cleanUpLeavesRunningDevicesAlone();
+    void claimReplacesWhatAKilledDeviceLeft();
+    void controlSocketBelongsToTheName();
+};
+
+namespace
+{
+
+QTemporaryDir* runtime = nullptr;
+
+/// What stands there after kill -9: the folder and a lock file that nobody holds.
+void leaveBehind(const QString& name)
+{
+    QDir().mkpath(DeviceFolder::root() + '/' + name + "/state/mnt");
+    QFile lock(DeviceFolder::root() + '/' + name + ".lock");
+    QVERIFY(lock.open(QIODevice::WriteOnly));
+}
+
+} // namespace
+
+void DeviceFolderTest::init()
+{
+    runtime = new QTemporaryDir;
+    qputenv("XDG_RUNTIME_DIR", runtime->path().toLocal8Bit());
+    // Made private, as claiming a name does.
+    QCOMPARE(::mkdir(qPrintable(DeviceFolder::root()), 0700), 0);
+}
+
+void DeviceFolderTest::cleanup()
+{
+    delete runtime;
+    runtime = nullptr;
+}
+
+void DeviceFolderTest::folderLiesInTheRuntimeFolderForItsOwnerAlone()
+{
+    DeviceFolder folder;
+    QCOMPARE(folder.claim("bench"), std::nullopt);
+    QCOMPARE(folder.name(), "bench");
+    QCOMPARE(folder.path(), runtime->path() + "/virtual-device/bench");
+    QCOMPARE(folder.path("log"), folder.path() + "/log");
+    struct stat status
+    {
+    };
+    QCOMPARE(::stat(qPrintable(folder.path()), &status), 0);
+    QCOMPARE(status.st_mode & 0777, 0700U);
+}
+
+void DeviceFolderTest::runtimeFolderOfSomebodyElseIsNotUsed()
+{
+    const QString fallback = QString("/tmp/virtual-device-%1").arg(::geteuid());
+    QCOMPARE(::chmod(qPrintable(runtime->path()), 0755), 0);
+    QCOMPARE(DeviceFolder::root(), fallback);
+    qunsetenv("XDG_RUNTIME_DIR");
+    QCOMPARE(DeviceFolder::root(), fallback);
+}
+
+void DeviceFolderTest::unnamedDevicesTakeTheFirstFreeNumber()
+{
+    DeviceFolder first;
+    DeviceFolder second;
+    DeviceFolder third;
+    QCOMPARE(first.claim({}), std::nullopt);
+    QCOMPARE(second.claim({}), std::nullopt);
+    QCOMPARE(first.name(), "device-1");
+    QCOMPARE(second.name(), "device-2");
+    first.release();
+    QCOMPARE(third.claim({}), std::nullopt);
+    QCOMPARE(third.name(), "device-1");
+}
+
+void DeviceFolderTest::nameThatIsTakenIsRefused()
+{
+    DeviceFolder first;
+    DeviceFolder second;
+    QCOMPARE(first.claim("bench"), std::nullopt);
+    QCOMPARE(second.claim("bench"), QString("a device named \"bench\" is running: choose another name with --name"));
+    QVERIFY(QDir(first.path()).exists());
+}
+
+void DeviceFolderTest::nameCanBeTakenAgainAfterRelease()
+{
+    DeviceFolder first;
+    QCOMPARE(first.claim("bench"), std::nullopt);
+    first.release();
+    QVERIFY(QDir(DeviceFolder::root()).isEmpty());
+    DeviceFolder second;
+    QCOMPARE(second.claim("bench"), std::nullopt);
+}
+
+void DeviceFolderTest::names_data()
+{
+    QTest::addColumn<QString>("name");
+    QTest::addColumn<bool>("isName");
+    QTest::addRow("letters") << "bench" << true;
+    QTest::addRow("all kinds") << "Bench_2-b" << true;
+    QTest::addRow("longest") << QString(24, 'x') << true;
+    QTest::addRow("too long") << QString(25, 'x') << false;
+    QTest::addRow("empty") << "" << false;
+    QTest::addRow("way out") << ".." << false;
+    QTest::addRow("slash") << "a/b" << false;
+    QTest::addRow("option") << "-a" << false;
+    QTest::addRow("line end") << "a\n" << false;
+}
+
+void DeviceFolderTest::names()
+{
+    QFETCH(const QString, name);
+    QTEST(DeviceFolder::isName(name), "isName");
+}
+
+void DeviceFolderTest::runningDevicesAreThoseThatHoldTheirName()
+{
+    leaveBehind("killed");
+    QVERIFY(DeviceFolder::running().isEmpty());
+    DeviceFolder folder;
+    QCOMPARE(folder.claim("bench"), std::nullopt);
+    QCOMPARE(DeviceFolder::running(), QStringList{"bench"});
+    folder.release();
+    QVERIFY(DeviceFolder::running().isEmpty());
+}
+
+void DeviceFolderTest::cleanUpRemovesWhatAKilledDeviceLeft()
+{
+    leaveBehind("killed");
+    QCOMPARE(DeviceFolder::cleanUp(), QStringList{"killed"});
+    QVERIFY(QDir(DeviceFolder::root()).isEmpty());
+}
+
+void DeviceFolderTest::cleanUpLeavesRunningDevicesAlone()
+{
+    DeviceFolder folder;
+    QCOMPARE(folder.claim("bench"), std::nullopt);
+    QVERIFY(DeviceFolder::cleanUp().isEmpty());
+    QVERIFY(QDir(folder.path()).exists());
+}
+
+void DeviceFolderTest::claimReplacesWhatAKilledDeviceLeft()
+{
+    leaveBehind("bench");
+    DeviceFolder folder;
+    QCOMPARE(folder.claim("bench"), std::nullopt);
+    QVERIFY(QDir(folder.path()).isEmpty());
+}
+
+void DeviceFolderTest::controlSocketBelongsToTheName()
+{
+    QCOMPARE(DeviceFolder::controlSocket("bench"), runtime->path() + "/virtual-device/bench/control");
+}
+
+QTEST_GUILESS_MAIN(DeviceFolderTest)
+#include "DeviceFolderTest.moc"
