@@ -4,15 +4,22 @@
 #include "virtual-device/screen/Screen.h"
 
 #include "tests/virtual-device/SampleProgram.h"
+#include "virtual-device/control/LiveTable.h"
+#include "virtual-device/registry/Registry.h"
 #include "virtual-device/screen/KeyTable.h"
 #include "virtual-device/screen/RegionMap.h"
 #include "virtual-device/screen/RegionWatch.h"
+#include "virtual-device/screen/SignalLines.h"
 
 #include <QElapsedTimer>
 #include <QSignalSpy>
 #include <QTemporaryDir>
 #include <QTest>
 
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <array>
 #include <memory>
 
 using namespace VirtualDevice;
@@ -45,11 +52,11 @@ private slots:
     void regionsHaveNoColourOnceTheProgramIsGone();
     void pngFileHoldsThePicture();
     void screenComesBackWithANewProgram();
+    void signalLineArrivesAgainAndAgainUntilItIsSwitchedOff();
+    void signalLineThatIsSetBeforeTheProgramStandsArrivesThen();
+    void tableOnATerminalIsRedrawnWhenAColourChanges();
     void frozenProgramHoldsNobodyUp();
     void screenEndsWhileTheProgramIsFrozenInTheHandshake();
-
-    void everyRegionOfTheMapHasAUniqueName();
-    void dominantColourIsTheMostFrequentOne();
 
 private:
     [[nodiscard]] bool waitForPicture() const;
@@ -230,6 +237,72 @@ void ScreenTest::screenComesBackWithANewProgram()
     QVERIFY(waitForKeyEvents({QString("press %1").arg(int(Qt::Key_F5))}));
 }
 
+void ScreenTest::signalLineArrivesAgainAndAgainUntilItIsSwitchedOff()
+{
+    Registry registry;
+    const SignalLines lines(registry, *screen);
+    const QString press = QString("press %1").arg(int(Qt::Key_F10));
+    const QString release = QString("release %1").arg(int(Qt::Key_F10));
+    QCOMPARE(registry.set("trigger.period", 20), std::nullopt);
+    QVERIFY(QTest::qWaitFor([&] { return program->keyEvents().count(press) >= 5; }, limit));
+
+    QCOMPARE(registry.set("trigger.period", 0), std::nullopt);
+    QVERIFY(screen->press("x"));
+    const QString end = QString("press %1").arg(int(Qt::Key_X));
+    QVERIFY(QTest::qWaitFor([&] { return program->keyEvents().contains(end); }, limit));
+    QCOMPARE(registry.set("radioline.period", 20), std::nullopt);
+    const QString radio = QString("press %1").arg(int(Qt::Key_F11));
+    QVERIFY(QTest::qWaitFor([&] { return program->keyEvents().count(radio) >= 5; }, limit));
+
+    const QStringList events = program->keyEvents();
+    QCOMPARE(events.mid(0, 4), (QStringList{press, release, press, release}));
+    QCOMPARE(events.lastIndexOf(press), events.indexOf(end) - 2);
+}
+
+void ScreenTest::signalLineThatIsSetBeforeTheProgramStandsArrivesThen()
+{
+    program->stop();
+    QTRY_VERIFY_WITH_TIMEOUT(!screen->isConnected(), limit);
+    Registry registry;
+    QCOMPARE(registry.set("trigger.period", 20), std::nullopt);
+    const SignalLines lines(registry, *screen);
+    QVERIFY(program->start());
+    const QString press = QString("press %1").arg(int(Qt::Key_F10));
+    QVERIFY(QTest::qWaitFor([&] { return program->keyEvents().count(press) >= 2; }, limit));
+}
+
+void ScreenTest::tableOnATerminalIsRedrawnWhenAColourChanges()
+{
+    int ends[2];
+    QCOMPARE(::pipe2(ends, O_CLOEXEC | O_NONBLOCK), 0);
+    QByteArray written;
+    const auto read = [&] {
+        std::array<char, 4096> buffer{};
+        for (ssize_t count = 0; (count = ::read(ends[0], buffer.data(), buffer.size())) > 0;)
+            written.append(buffer.data(), count);
+    };
+    const LiveTable table(*regions, ends[1]);
+    read();
+    QCOMPARE(written, table.lines());
+    for (const auto& name : RegionMap::names())
+        QVERIFY2(written.contains(name.toUtf8() + ' '), qPrintable(name));
+    QVERIFY(written.contains("key.down            \x1b[30;47mwhite  \x1b[0m"));
+    const auto rows = written.count('\n');
+    QCOMPARE(rows, (RegionMap::names().size() + 1) / 2);
+
+    written.clear();
+    QVERIFY(screen->press("Down"));
+    QVERIFY(QTest::qWaitFor(
+        [&] {
+            read();
+            return written.contains("key.down            \x1b[30;42mgreen  \x1b[0m");
+        },
+        limit));
+    QVERIFY(written.startsWith("\x1b[" + QByteArray::number(rows) + "A\r"));
+    ::close(ends[0]);
+    ::close(ends[1]);
+}
+
 void ScreenTest::frozenProgramHoldsNobodyUp()
 {
     program->freeze();
@@ -249,37 +322,6 @@ void ScreenTest::screenEndsWhileTheProgramIsFrozenInTheHandshake()
     QVERIFY(!opened.wait(200));
     second.reset();
     program->thaw();
-}
-
-void ScreenTest::everyRegionOfTheMapHasAUniqueName()
-{
-    const QStringList names = RegionMap::names();
-    QCOMPARE(QSet<QString>(names.begin(), names.end()).size(), names.size());
-    for (const auto& name : names) {
-        QVERIFY(RegionMap::find(name) != nullptr);
-        QVERIFY2(!RegionMap::find(name)->help.empty(), qPrintable(name));
-    }
-    QCOMPARE(RegionMap::find("nowhere"), nullptr);
-}
-
-void ScreenTest::dominantColourIsTheMostFrequentOne()
-{
-    QImage picture(10, 10, QImage::Format_RGB32);
-    picture.fill(qRgb(0, 128, 0));
-    for (int x = 0; x < 10; ++x)
-        for (int y = 0; y < 4; ++y)
-            picture.setPixelColor(x, y, Qt::black);
-    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 10}), RegionColour::Green);
-    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 5}), RegionColour::Other);
-    QCOMPARE(RegionMap::dominantColour(picture, {0, 9, 100, 100}), RegionColour::Green);
-    QCOMPARE(RegionMap::dominantColour(picture, {10, 10, 5, 5}), RegionColour::None);
-    QCOMPARE(RegionMap::dominantColour(QImage(), {0, 0, 10, 10}), RegionColour::None);
-    picture.fill(qRgb(0, 127, 0));
-    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 10}), RegionColour::Other);
-    picture.fill(qRgb(255, 0, 0));
-    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 10}), RegionColour::Red);
-    picture.fill(Qt::white);
-    QCOMPARE(RegionMap::dominantColour(picture, {0, 0, 10, 10}), RegionColour::White);
 }
 
 QTEST_MAIN(ScreenTest)

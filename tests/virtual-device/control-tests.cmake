@@ -17,3 +17,9 @@ immunityrig_test(RegistryTest SOURCES virtual-device/RegistryTest.cpp LIBRARIES 
 immunityrig_test(ControlServerTest
   SOURCES virtual-device/ControlServerTest.cpp virtual-device/ControlBench.cpp virtual-device/ControlBench.h
   LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(RegionMapTest SOURCES virtual-device/RegionMapTest.cpp LIBRARIES VirtualDevice LABELS unit)
+set_target_properties(RegionMapTest PROPERTIES AUTOUIC_SEARCH_PATHS "${PROJECT_SOURCE_DIR}")
+immunityrig_test(CtlTest
+  SOURCES virtual-device/CtlTest.cpp virtual-device/ControlBench.cpp virtual-device/ControlBench.h
+  LIBRARIES VirtualDevice LABELS unit)
+add_dependencies(CtlTest virtual-device)

@@ -124,7 +124,7 @@ private:
     [[nodiscard]] QString argument(int index) const { return request.words.at(index); }
 
     /// Prints the result, or what was refused.
-    int finish(const ControlReply& reply, const QString& plain = {}) const
+    int finish(const ControlReply& reply, const std::optional<QString>& plain = {}) const
     {
         if (!reply.isOk()) {
             complain(reply.message);
@@ -132,8 +132,8 @@ private:
         }
         if (request.isJson)
             print(json(reply.result));
-        else if (!plain.isEmpty())
-            print(plain);
+        else if (plain)
+            print(*plain);
         return done;
     }
 
