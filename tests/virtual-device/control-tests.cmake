@@ -23,3 +23,14 @@ immunityrig_test(CtlTest
   SOURCES virtual-device/CtlTest.cpp virtual-device/ControlBench.cpp virtual-device/ControlBench.h
   LIBRARIES VirtualDevice LABELS unit)
 add_dependencies(CtlTest virtual-device)
+
+# Everything together, as root and as an ordinary user where root calls.
+immunityrig_test(DeviceControlTest ON_DEVICE
+  SOURCES virtual-device/DeviceControlTest.cpp LIBRARIES DeviceTestSupport LABELS device)
+add_dependencies(DeviceControlTest virtual-device immunityrig)
+add_test(NAME DeviceControlTestAsOrdinaryUser
+  COMMAND "${PROJECT_SOURCE_DIR}/tests/as-ordinary-user.sh" $<TARGET_FILE:DeviceControlTest>)
+foreach(property TIMEOUT LABELS ENVIRONMENT)
+  get_test_property(DeviceControlTest ${property} value)
+  set_tests_properties(DeviceControlTestAsOrdinaryUser PROPERTIES ${property} "${value}")
+endforeach()
