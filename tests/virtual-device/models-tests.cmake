@@ -5,3 +5,5 @@ immunityrig_test(LineDamageTest SOURCES virtual-device/LineDamageTest.cpp LIBRAR
 immunityrig_test(RadioModelTest SOURCES virtual-device/RadioModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(DspCodecTest SOURCES virtual-device/DspCodecTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(DspModelTest SOURCES virtual-device/DspModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(SoundMatcherTest SOURCES virtual-device/SoundMatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(AudioWatcherTest SOURCES virtual-device/AudioWatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)

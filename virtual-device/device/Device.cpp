@@ -5,6 +5,7 @@
 
 #include "virtual-device/sandbox/StateFolder.h"
 
+#include <QCoreApplication>
 #include <QDir>
 #include <QFileInfo>
 #include <QImage>
@@ -28,6 +29,13 @@ bool isBlack(const QImage& picture)
     return picture == empty;
 }
 
+/// Beside the programs of this build.
+QString mixerPlugin()
+{
+    return QDir(QCoreApplication::applicationDirPath())
+        .absoluteFilePath(QStringLiteral("../virtual-device/libMixerPlugin.so"));
+}
+
 } // namespace
 
 Device::Device(DeviceOptions choices, QObject* parent)
@@ -35,6 +43,7 @@ Device::Device(DeviceOptions choices, QObject* parent)
       options(std::move(choices)),
       radio(values),
       dsp(values),
+      audio(values),
       deviceTree(values),
       dataPartition(values)
 {
@@ -147,6 +156,7 @@ void Device::addModels(SandboxPlan& plan) const
         plan.add(radio.devicePath(), QStringLiteral("/dev/ttyS1"), Kind::Device);
     if (values.text(QStringLiteral("dsp.presence")) != u"missing")
         plan.add(deviceFolder.path(QStringLiteral("dsplink")), QStringLiteral("/dev/dsplink"), Kind::Writable);
+    audio.contribute(plan, mixerPlugin());
 }
 
 void Device::addScreen(SandboxPlan& plan) const
@@ -192,6 +202,7 @@ void Device::watchModels()
 void Device::tearDown()
 {
     sandbox.kill();
+    audio.close();
     dsp.close();
     logStore.close();
     dataPartition.unmount();

@@ -3,6 +3,7 @@
 
 #pragma once
 
+#include "virtual-device/audio/AudioWatcher.h"
 #include "virtual-device/control/ControlServer.h"
 #include "virtual-device/control/Monitor.h"
 #include "virtual-device/dsp/DspModel.h"
@@ -93,6 +94,7 @@ private:
     LogStore logStore;
     RadioModel radio;
     DspModel dsp;
+    AudioWatcher audio;
     DeviceTree deviceTree;
     DataPartition dataPartition;
     VncRelay relay;

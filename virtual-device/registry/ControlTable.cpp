@@ -208,6 +208,19 @@ constexpr std::array controls{
     reported(integerControl("dsp.sensor_frames", "", 0, plenty, "0", "sensor frames made")),
     reported(integerControl("dsp.violations", "", 0, plenty, "0", "times the program broke the rules")),
     reported(textControl("dsp.last_violation", 200, "", "what the program did wrong last")),
+
+    // The loudspeaker and its volume control.
+    choiceControl("audio.presence", "present|missing|no-output|no-mixer", "present",
+                  "what of the sound card exists; read when the program's surroundings are built"),
+    switchControl("audio.forget", "off", "puts audio.gap_ms and audio.mismatches back to 0; off again when done"),
+    reported(switchControl("audio.playing", "off", "the sound is heard")),
+    reported(integerControl("audio.sounds", "", 0, plenty, "0", "times the sound began")),
+    reported(integerControl("audio.buffers", "", 0, plenty, "0", "buffers of 256 ms heard, silent ones included")),
+    reported(integerControl("audio.gap_ms", "ms", 0, plenty, "0", "longest silence since the first sound")),
+    reported(integerControl("audio.mismatches", "", 0, plenty, "0", "buffers that are not what the sound file holds")),
+    reported(integerControl("audio.volume_left", "", 0, 60, "0", "what the mixer was set to")),
+    reported(integerControl("audio.volume_right", "", 0, 60, "0", "what the mixer was set to")),
+    reported(integerControl("audio.volume_writes", "", 0, plenty, "0", "times the mixer was set")),
 };
 
 } // namespace

@@ -1,0 +1,266 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "virtual-device/audio/AudioWatcher.h"
+
+#include "virtual-device/audio/MixerState.h"
+#include "virtual-device/registry/Registry.h"
+#include "virtual-device/sandbox/SandboxPlan.h"
+#include "virtual-device/sandbox/StateFolder.h"
+
+#include <QElapsedTimer>
+#include <QFile>
+#include <QTemporaryDir>
+#include <QTest>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+using namespace VirtualDevice;
+
+namespace
+{
+
+constexpr qsizetype bufferSize = SoundMatcher::bufferSize;
+const QByteArray silence(bufferSize, '\0');
+
+/// The program's audio library: writes buffers to the pipe as they are.
+class Writer
+{
+public:
+    explicit Writer(const QString& path) : descriptor(::open(path.toLocal8Bit().constData(), O_WRONLY | O_CLOEXEC)) {}
+    ~Writer() { ::close(descriptor); }
+    Writer(const Writer&) = delete;
+    Writer& operator=(const Writer&) = delete;
+
+    [[nodiscard]] bool write(const QByteArray& bytes) const
+    {
+        return ::write(descriptor, bytes.constData(), static_cast<std::size_t>(bytes.size())) == bytes.size();
+    }
+
+private:
+    int descriptor;
+};
+
+} // namespace
+
+class AudioWatcherTest : public QObject
+{
+    Q_OBJECT
+
+    std::unique_ptr<QTemporaryDir> folder;
+    std::unique_ptr<Registry> registry;
+    std::unique_ptr<AudioWatcher> watcher;
+    QByteArray samples;
+
+    [[nodiscard]] qint64 number(const char* name) const { return registry->integer(QString::fromLatin1(name)); }
+    [[nodiscard]] bool flag(const char* name) const { return registry->flag(QString::fromLatin1(name)); }
+    [[nodiscard]] QString stream() const { return folder->filePath(QStringLiteral("sound/stream")); }
+    [[nodiscard]] QString wav() const { return folder->filePath(QStringLiteral("sound.wav")); }
+
+    void writeWav(const QByteArray& content) const
+    {
+        QFile file(wav());
+        QVERIFY(file.open(QIODevice::WriteOnly | QIODevice::Truncate));
+        QCOMPARE(file.write(content), content.size());
+    }
+
+    /// The sound as the audio library plays it: whole buffers, the last one filled up with zeros.
+    [[nodiscard]] QByteArray played() const
+    {
+        const auto over = samples.size() % bufferSize;
+        return samples + QByteArray(over == 0 ? 0 : bufferSize - over, '\0');
+    }
+
+private slots:
+    void init()
+    {
+        folder = std::make_unique<QTemporaryDir>();
+        registry = std::make_unique<Registry>();
+        watcher = std::make_unique<AudioWatcher>(*registry);
+        writeWav(testSound());
+        samples = wavSamples(testSound());
+        QCOMPARE(samples.size(), 32'000);
+        const auto problem = watcher->open(folder->filePath(QStringLiteral("sound")), wav());
+        QVERIFY2(!problem, qPrintable(problem.value_or(QString())));
+    }
+
+    void cleanup()
+    {
+        watcher.reset();
+        registry.reset();
+        folder.reset();
+    }
+
+    void theSoundIsHeardAndComparedWithItsFile()
+    {
+        const Writer program(stream());
+        QVERIFY(program.write(silence));
+        QTRY_COMPARE(number("audio.buffers"), 1);
+        QVERIFY(!flag("audio.playing"));
+        QVERIFY(program.write(played()));
+        QTRY_COMPARE(number("audio.buffers"), 5);
+        QVERIFY(flag("audio.playing"));
+        QVERIFY(program.write(silence));
+        QTRY_VERIFY(!flag("audio.playing"));
+        QCOMPARE(number("audio.sounds"), 1);
+        QCOMPARE(number("audio.mismatches"), 0);
+    }
+
+    void theLongestSilenceBetweenSoundsIsMeasured()
+    {
+        const Writer program(stream());
+        for (int count = 0; count < 4; ++count) // before the first sound: no gap
+            QVERIFY(program.write(silence));
+        QVERIFY(program.write(played()));
+        QTRY_COMPARE(number("audio.buffers"), 8);
+        QCOMPARE(number("audio.gap_ms"), 24); // the rest of the last buffer
+        QVERIFY(program.write(silence + silence));
+        QTRY_COMPARE(number("audio.gap_ms"), 24 + 2 * 256); // while it lasts
+        QVERIFY(program.write(played()));
+        QTRY_COMPARE(number("audio.buffers"), 14); // the pipe holds eight, and both its ends are in this thread
+        QVERIFY(program.write(silence + played()));
+        QTRY_COMPARE(number("audio.sounds"), 3);
+        QTRY_COMPARE(number("audio.buffers"), 19);
+        QCOMPARE(number("audio.gap_ms"), 24 + 2 * 256);
+        QCOMPARE(number("audio.mismatches"), 0);
+    }
+
+    void buffersMayComeInPieces()
+    {
+        const Writer program(stream());
+        const QByteArray bytes = played() + silence;
+        for (qsizetype at = 0; at < bytes.size(); at += 3000) {
+            QVERIFY(program.write(bytes.mid(at, 3000)));
+            QTest::qWait(1);
+        }
+        QTRY_COMPARE(number("audio.buffers"), 5);
+        QCOMPARE(number("audio.mismatches"), 0);
+    }
+
+    void aWrongBufferIsAMismatch()
+    {
+        const Writer program(stream());
+        QByteArray bytes = played();
+        bytes[bufferSize + 17] = static_cast<char>(bytes[bufferSize + 17] ^ 1);
+        QVERIFY(program.write(bytes));
+        QTRY_COMPARE(number("audio.buffers"), 4);
+        QCOMPARE(number("audio.mismatches"), 1);
+    }
+
+    void aStreamThatStopsIsAGapThatGrows()
+    {
+        const Writer program(stream());
+        QVERIFY(program.write(played().first(bufferSize)));
+        QTRY_VERIFY(flag("audio.playing"));
+        QElapsedTimer clock;
+        clock.start();
+        QTRY_VERIFY(!flag("audio.playing"));
+        QTRY_VERIFY(number("audio.gap_ms") > 1000);
+        QVERIFY(clock.elapsed() >= 1000);
+        const auto before = number("audio.gap_ms");
+        QVERIFY(program.write(played().mid(bufferSize, bufferSize)));
+        QTRY_VERIFY(flag("audio.playing"));
+        QVERIFY(number("audio.gap_ms") >= before);
+        QCOMPARE(number("audio.mismatches"), 0);
+    }
+
+    void gapsAndMismatchesCanBeForgotten()
+    {
+        const Writer program(stream());
+        QVERIFY(program.write(played() + silence + QByteArray(bufferSize, 'x')));
+        QTRY_COMPARE(number("audio.mismatches"), 1);
+        QVERIFY(number("audio.gap_ms") > 0);
+        QVERIFY(!registry->set(QStringLiteral("audio.forget"), true));
+        QCOMPARE(number("audio.gap_ms"), 0);
+        QCOMPARE(number("audio.mismatches"), 0);
+        QVERIFY(!flag("audio.forget"));
+    }
+
+    void aSoundFileThatWasReplacedIsReadAnew()
+    {
+        const Writer program(stream());
+        QVERIFY(program.write(played() + silence));
+        QTRY_COMPARE(number("audio.buffers"), 5);
+        QByteArray other = testSound();
+        other[100] = static_cast<char>(other[100] ^ 1);
+        QTest::qWait(20); // file dates are no finer than the kernel's tick
+        writeWav(other);
+        samples = wavSamples(other);
+        QVERIFY(program.write(played()));
+        QTRY_COMPARE(number("audio.sounds"), 2);
+        QCOMPARE(number("audio.mismatches"), 0);
+    }
+
+    void aProgramThatEndsIsFollowedByTheNext()
+    {
+        for (int round = 1; round <= 3; ++round) {
+            {
+                const Writer program(stream());
+                QVERIFY(program.write(played().first(bufferSize + 100))); // ends within a buffer
+                QTRY_VERIFY(flag("audio.playing"));
+            }
+            QTRY_VERIFY(!flag("audio.playing"));
+            QCOMPARE(number("audio.sounds"), round);
+        }
+        QCOMPARE(number("audio.mismatches"), 0);
+        QTest::qWait(700); // nobody plays, and nobody is missed
+        QCOMPARE(number("audio.gap_ms"), 0);
+    }
+
+    void theMixerIsWatched()
+    {
+        const std::string state = folder->filePath(QStringLiteral("sound/mixer")).toStdString();
+        QVERIFY((MixerState{30, 30, 1}).write(state));
+        QTRY_COMPARE(number("audio.volume_left"), 30);
+        QCOMPARE(number("audio.volume_right"), 30);
+        QVERIFY((MixerState{60, 0, 2}).write(state));
+        QTRY_COMPARE(number("audio.volume_writes"), 2);
+        QCOMPARE(number("audio.volume_left"), 60);
+        QCOMPARE(number("audio.volume_right"), 0);
+    }
+
+    void theSandboxIsLedToThePipeAndTheMixer()
+    {
+        const auto planFor = [this](const char* presence) {
+            (void)registry->set(QStringLiteral("audio.presence"), QString::fromLatin1(presence));
+            SandboxPlan plan;
+            watcher->contribute(plan, wav()); // any file that exists
+            return plan;
+        };
+        const QStringList output{"SDL_AUDIODRIVER", "SDL_DISKAUDIODELAY", "SDL_DISKAUDIOFILE"};
+        SandboxPlan plan = planFor("present");
+        QCOMPARE(plan.environment.keys(), QStringList{"ALSA_CONFIG_PATH"} + output);
+        QCOMPARE(plan.environment.value("SDL_AUDIODRIVER"), QStringLiteral("disk"));
+        QCOMPARE(plan.environment.value("SDL_DISKAUDIODELAY"), QStringLiteral("256"));
+        QCOMPARE(plan.environment.value("SDL_DISKAUDIOFILE"), QStringLiteral("/run/sound/stream"));
+        QCOMPARE(plan.binds.size(), 2);
+        QCOMPARE(plan.binds[0].target, QStringLiteral("/run/sound"));
+        QCOMPARE(plan.binds[1].target, QStringLiteral("/run/sound-card/mixer.so"));
+        QCOMPARE(planFor("no-mixer").environment.keys(), output);
+        QCOMPARE(planFor("no-output").environment.keys(), QStringList{"ALSA_CONFIG_PATH"});
+        plan = planFor("missing");
+        QVERIFY(plan.environment.isEmpty());
+        QVERIFY(plan.binds.isEmpty());
+    }
+
+    void aPluginThatWasNotBuiltIsLeftOut()
+    {
+        SandboxPlan plan;
+        watcher->contribute(plan, QStringLiteral("/nowhere/mixer.so"));
+        QCOMPARE(plan.binds.size(), 1);
+        QVERIFY(!plan.environment.contains(QStringLiteral("ALSA_CONFIG_PATH")));
+    }
+
+    void aFolderThatCannotBeMadeIsReported()
+    {
+        AudioWatcher other(*registry);
+        const auto problem = other.open(QStringLiteral("/proc/nowhere"), wav());
+        QVERIFY(problem);
+        QVERIFY(problem->contains(QStringLiteral("/proc/nowhere")));
+    }
+};
+
+QTEST_GUILESS_MAIN(AudioWatcherTest)
+#include "AudioWatcherTest.moc"
