@@ -105,6 +105,9 @@ std::optional<QString> Device::makeFiles()
         return problem;
     if (auto problem = dsp.open(deviceFolder.path(QStringLiteral("dsplink"))))
         return problem;
+    const QString sound = stateFolder() + QStringLiteral("/etc/sounds/TestSound.wav");
+    if (auto problem = audio.open(deviceFolder.path(QStringLiteral("sound")), sound))
+        return problem;
     if (auto problem = logStore.open(deviceFolder.path(QStringLiteral("log"))))
         return problem;
     return controlServer.listen(controlSocket());
