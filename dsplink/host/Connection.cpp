@@ -160,7 +160,7 @@ DSP_STATUS Connection::send(std::uint32_t queue, ByteView message)
     bool taken = false;
     {
         const std::lock_guard lock(mutex);
-        if (lost || !sendOrQueue(head, message, message.data(), taken))
+        if (lost || !transportOpen || !sendOrQueue(head, message, message.data(), taken))
             return DSP_EFAIL;
     }
     if (taken)
@@ -184,11 +184,18 @@ bool Connection::sendOrQueue(ByteView head, ByteView body, const void* buffer, b
     return true;
 }
 
-void Connection::cancelTransport()
+void Connection::openTransport()
+{
+    const std::lock_guard lock(mutex);
+    transportOpen = true;
+}
+
+void Connection::closeTransport()
 {
     std::deque<Outgoing> dropped;
     {
         const std::lock_guard lock(mutex);
+        transportOpen = false;
         for (const auto& [serial, entry] : pending)
             entry->done = entry->done || entry->kind == PacketKind::Locate;
         const auto messages = std::stable_partition(outgoing.begin(), outgoing.end(),

@@ -62,11 +62,13 @@ public:
                                      std::uint32_t* value = nullptr);
 
     /// Sends the message without blocking; the listener hears when `message` is no longer needed. `DSP_EFAIL`: the
-    /// peer is gone and the message still the caller's.
+    /// transport is closed or the peer gone, and the message still the caller's.
     [[nodiscard]] DSP_STATUS send(std::uint32_t queue, ByteView message);
 
-    /// Ends every locate that waits (`DSP_EFAIL`) and drops the messages that the socket has not taken.
-    void cancelTransport();
+    /// From here on messages are sent.
+    void openTransport();
+    /// From here on they are not: ends every locate that waits (`DSP_EFAIL`) and drops what the socket has not taken.
+    void closeTransport();
 
     /// There is room for messages again.
     void resumeReading();
@@ -107,6 +109,7 @@ private:
     std::map<std::uint32_t, Pending*> pending; ///< by serial; the entries live on their callers' stacks
     std::deque<Outgoing> outgoing;
     std::uint32_t lastSerial = 0;
+    bool transportOpen = false;
     bool lost = false;
     bool closing = false;
 

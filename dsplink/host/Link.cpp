@@ -271,6 +271,8 @@ DSP_STATUS Link::openTransport()
     if (now < Stage::Started)
         return DSP_EACCESSDENIED;
     setAcceptsMessages(true);
+    if (const auto peer = currentConnection())
+        peer->openTransport();
     return advance(PacketKind::TransportOpen, {}, Stage::TransportOpen, DSP_SOK);
 }
 
@@ -292,7 +294,7 @@ DSP_STATUS Link::closeTransport()
     }
     changed.notify_all();
     if (const auto peer = currentConnection())
-        peer->cancelTransport();
+        peer->closeTransport();
     const DSP_STATUS status = ask(PacketKind::TransportClose, {}, replyTimeout);
     return DSP_FAILED(status) ? status : DSP_SCLOSED;
 }

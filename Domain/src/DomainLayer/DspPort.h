@@ -32,7 +32,7 @@ namespace Domain
 /// one reader's. A thread of the port's own fetches messages; `readyRead()` is emitted there, once a message.
 ///
 /// Errors: a DSPLink call that fails while opening is logged as fatal and the sequence goes on, so the port is open
-/// whatever the DSP says; without a DSP every write then fails (-1, logged as fatal) and nothing ever arrives. Locating
+/// whatever the DSP says; without a DSP every write then fails (-1, logged) and nothing ever arrives. Locating
 /// the DSP's queue waits as long as running firmware takes to make it.
 class DspPort : public QIODevice
 {
