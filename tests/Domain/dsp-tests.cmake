@@ -5,3 +5,7 @@
 if(NOT DSPLINK_ROOT)
   immunityrig_test(DspLinkHostTest SOURCES dsplink/DspLinkHostTest.cpp LIBRARIES DspLink LABELS integration)
 endif()
+immunityrig_test(DspPortTest SOURCES Domain/DspPortTest.cpp Domain/DspTestParts.h LIBRARIES Domain LABELS integration)
+immunityrig_test(DspTest SOURCES Domain/DspTest.cpp LIBRARIES Domain LABELS integration)
+immunityrig_test(DspReceiveTest SOURCES Domain/DspReceiveTest.cpp LIBRARIES Domain LABELS integration)
+immunityrig_test(DspRecordsTest SOURCES Domain/DspRecordsTest.cpp LIBRARIES Domain LABELS unit)

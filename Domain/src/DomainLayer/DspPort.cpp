@@ -93,10 +93,10 @@ QByteArray extractData(MSGQ_Msg message)
 {
     const char* const data = dataOf(message);
     const qint64 present = std::max<qint64>(MSGQ_getMsgSize(message) - headerSize, 0);
-    const qint64 stated = qint64{wordAt(data, present, 4)} + wordsSize;
+    // A message without both words cannot state a length.
+    const qint64 stated = present < wordsSize ? present : qint64{wordAt(data, present, 4)} + wordsSize;
     const qint64 largest = std::min(maximumDataSize, present);
-    // Less than both words cannot state a length.
-    if (stated > maximumDataSize || (stated > present && present >= wordsSize))
+    if (stated > largest)
         Debug::warningMessage(__FILE__, __LINE__,
                               QStringLiteral("DspLink: Received message with invalid data length = %1").arg(stated));
     return {data, std::min(stated, largest)};

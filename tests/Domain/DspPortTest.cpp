@@ -1,0 +1,581 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "Domain/src/DomainLayer/DspPort.h"
+
+#include "tests/Domain/DspTestParts.h"
+
+#include <QCoreApplication>
+#include <QElapsedTimer>
+#include <QTest>
+#include <QThread>
+#include <QTimer>
+
+#include <atomic>
+#include <future>
+#include <memory>
+
+using Domain::DspPort;
+using TestSupport::DspPeer;
+using TestSupport::sourcedTexts;
+
+namespace
+{
+
+constexpr quint32 dataType = 0x11004;
+constexpr quint32 ackType = 0x1100B;
+constexpr quint32 nakType = 0x1100C;
+
+const QStringList openTexts{QStringLiteral("DspLink: DSP execution started successfully."),
+                            QStringLiteral("DspPort: open complete.")};
+
+} // namespace
+
+/// The port over the host library and a real socket.
+class DspPortTest : public QObject
+{
+    Q_OBJECT
+
+private:
+    std::unique_ptr<TestSupport::LogCapture> log;
+    std::unique_ptr<DspPeer> peer;
+    std::unique_ptr<DspPort> port;
+    std::atomic<int> announced = 0;
+    std::atomic<QThread*> announcer = nullptr;
+
+    void makePort(const QString& image = QStringLiteral("/dsp.out"))
+    {
+        port = std::make_unique<DspPort>(image);
+        announced = 0;
+        connect(
+            port.get(), &DspPort::readyRead, this,
+            [this] {
+                ++announced;
+                announcer = QThread::currentThread();
+            },
+            Qt::DirectConnection);
+    }
+
+    void openPort()
+    {
+        makePort();
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        QCOMPARE(sourcedTexts(*log), openTexts);
+    }
+
+    QByteArray next() { return port->readLine(port->maxBytesAvailable() + 1); }
+
+    void arrived(int count) { QTRY_COMPARE_WITH_TIMEOUT(announced.load(), count, 20000); }
+
+    /// Data of `size` bytes that states its own length.
+    static QByteArray message(quint32 type, qsizetype size, char fill = 'x')
+    {
+        return DspPeer::dspMessage(type, QByteArray(size - 8, fill));
+    }
+
+private slots:
+    void init()
+    {
+        TestSupport::writeFirmware();
+        log = std::make_unique<TestSupport::LogCapture>();
+        peer = std::make_unique<DspPeer>();
+    }
+
+    void cleanup()
+    {
+        peer.reset(); // first: with nothing to wait for the port closes quicker
+        port.reset();
+        log.reset();
+    }
+
+    void itIsASequentialDeviceReadByLineOnly()
+    {
+        openPort();
+        QVERIFY(port->isSequential());
+        QVERIFY(!port->canReadLine());
+        QCOMPARE(port->maxBytesAvailable(), 2028);
+        QVERIFY(peer->sendMessage(message(dataType, 40)));
+        arrived(1);
+        char byte = 0;
+        QCOMPARE(port->read(&byte, 1), -1);
+        QCOMPARE(next().size(), 40);
+    }
+
+    void openingLoadsStartsAndConnectsInOrder()
+    {
+        openPort();
+        QCOMPARE(peer->requestKinds(), (QList<DspPeer::Kind>{DspPeer::Attach, DspPeer::QueueOpen, DspPeer::Load,
+                                                             DspPeer::Start, DspPeer::TransportOpen, DspPeer::Locate}));
+        QCOMPARE(peer->requests().at(1).payload.mid(4), QByteArray("GPPMSGQ1"));
+        QCOMPARE(peer->requests().at(2).payload, QByteArray("/dsp.out"));
+        QCOMPARE(peer->requests().at(5).payload, QByteArray("DSPMSGQ0"));
+        QVERIFY(port->openMode() & QIODevice::Unbuffered);
+    }
+
+    void progressIsInformation()
+    {
+        makePort();
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        QVERIFY(log->waitFor(openTexts.at(1)));
+        for (const auto& line : log->lines())
+            QCOMPARE(line.priority, 6);
+    }
+
+    void thePathOfTheImageTravelsAsLatin1()
+    {
+        QFile image(QFile::decodeName(QByteArray("/firmware\xe4.out")));
+        const auto path = QString::fromLatin1("/firmware\xe4.out");
+        QCOMPARE(::rename("/dsp.out", path.toLatin1().constData()), 0);
+        makePort(path);
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        QCOMPARE(sourcedTexts(*log), openTexts);
+        QCOMPARE(peer->requests().at(2).payload, QByteArray("/firmware\xe4.out"));
+        ::unlink(path.toLatin1().constData());
+    }
+
+    void aRefusedStepIsFatalAndTheRestGoesOn_data()
+    {
+        QTest::addColumn<int>("kind");
+        QTest::addColumn<QString>("call");
+        QTest::newRow("attach") << int{DspPeer::Attach} << "PROC_attach(dspProcessorId, NULL)";
+        QTest::newRow("queue") << int{DspPeer::QueueOpen}
+                               << "MSGQ_open(processorMessageQueueName, &this->privateData->processorMessageQueue, "
+                                  "NULL)";
+        QTest::newRow("load")
+            << int{DspPeer::Load}
+            << "PROC_load(dspProcessorId, this->privateData->dspExecutablePath.toAscii().data(), 0, NULL)";
+        QTest::newRow("start") << int{DspPeer::Start} << "PROC_start(dspProcessorId)";
+        QTest::newRow("transport") << int{DspPeer::TransportOpen} << "MSGQ_transportOpen(dspProcessorId, &mqtAttrs)";
+        QTest::newRow("locate")
+            << int{DspPeer::Locate}
+            << "MSGQ_locate(dspMessageQueueName, &this->privateData->dspMessageQueue, &syncLocateAttrs)";
+    }
+
+    void aRefusedStepIsFatalAndTheRestGoesOn()
+    {
+        QFETCH(const int, kind);
+        QFETCH(const QString, call);
+        peer->answer(static_cast<DspPeer::Kind>(kind), 0x80008028U);
+        makePort();
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        QVERIFY(log->waitFor(openTexts.at(1)));
+        const auto lines = log->lines();
+        const auto fatal =
+            std::find_if(lines.begin(), lines.end(), [](const auto& line) { return line.priority == 0; });
+        QVERIFY(fatal != lines.end());
+        const auto texts = sourcedTexts(*log);
+        QVERIFY2(texts.contains(QStringLiteral("DspPort: %1. Status = 0x80008028").arg(call)),
+                 qPrintable(texts.join(u'\n')));
+        QVERIFY(texts.contains(openTexts.at(0)));
+    }
+
+    void withoutADspEveryCallIsReportedAndTheWindowStillComesUp()
+    {
+        peer.reset();
+        makePort();
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        const QStringList expected{
+            "DspPort: PROC_setup(NULL). Status = 0x80008008",
+            "DspPort: PROC_attach(dspProcessorId, NULL). Status = 0x8000801b",
+            "DspPort: POOL_open(this->privateData->applicationPoolId, &poolAttributes). Status = 0x80008000",
+            "DspPort: MSGQ_open(processorMessageQueueName, &this->privateData->processorMessageQueue, NULL). Status = "
+            "0x80008008",
+            "DspPort: PROC_load(dspProcessorId, this->privateData->dspExecutablePath.toAscii().data(), 0, NULL). "
+            "Status "
+            "= 0x8000800d",
+            "DspPort: PROC_start(dspProcessorId). Status = 0x8000800d",
+            openTexts.at(0),
+            "DspPort: MSGQ_transportOpen(dspProcessorId, &mqtAttrs). Status = 0x80008002",
+            "DspPort: MSGQ_locate(dspMessageQueueName, &this->privateData->dspMessageQueue, &syncLocateAttrs). Status "
+            "= "
+            "0x80008008",
+            openTexts.at(1)};
+        QStringList texts = sourcedTexts(*log);
+        // No queue is a valid target of error messages for the interface, so that call succeeds.
+        QCOMPARE(texts, expected);
+        QCOMPARE(port->write("x", 1), -1);
+        QCOMPARE(sourcedTexts(*log), QStringList{"DspPort: MSGQ_alloc() failed. Status = 0x80008008"});
+        // Nothing that was fatal before the event loop runs ends it.
+        QTimer::singleShot(50, qApp, [] { QCoreApplication::exit(7); });
+        QCOMPARE(QCoreApplication::exec(), 7);
+    }
+
+    void aMissingImageIsReported()
+    {
+        QVERIFY(QFile::remove(QStringLiteral("/dsp.out")));
+        makePort();
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        const QStringList texts = sourcedTexts(*log);
+        QCOMPARE(texts.first(),
+                 "DspPort: PROC_load(dspProcessorId, this->privateData->dspExecutablePath.toAscii().data(),"
+                 " 0, NULL). Status = 0x80008009");
+        QCOMPARE(texts.at(1), "DspPort: PROC_start(dspProcessorId). Status = 0x8000801b");
+    }
+
+    void withoutADspTheReadLoopCostsNothingAndStopsInHalfASecond()
+    {
+        peer.reset();
+        makePort();
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        const double before = TestSupport::processSeconds();
+        QTest::qSleep(1200);
+        QVERIFY2(TestSupport::processSeconds() - before < 0.2, "the read loop spins");
+        QElapsedTimer timer;
+        timer.start();
+        port->close();
+        QVERIFY2(timer.elapsed() < 2000, qPrintable(QString::number(timer.elapsed())));
+    }
+
+    void aLostDspDoesNotMakeTheReadLoopSpin()
+    {
+        openPort();
+        peer->hangUp();
+        QTRY_VERIFY(!peer->isConnected());
+        QTest::qSleep(100);
+        const double before = TestSupport::processSeconds();
+        QTest::qSleep(1200);
+        QVERIFY2(TestSupport::processSeconds() - before < 0.2, "the read loop spins");
+    }
+
+    void aWriteIsOneMessageWithAClearedTail()
+    {
+        openPort();
+        QCOMPARE(port->write(QByteArray(2028, 'o')), 2028);
+        QCOMPARE(port->write("command"), 7);
+        QTRY_COMPARE(peer->messages().size(), 2);
+        const auto sent = peer->messages().at(1);
+        QCOMPARE(sent.id(), 0x41);
+        QCOMPARE(sent.destination, DspPeer::dspQueue);
+        QCOMPARE(sent.data, QByteArray("command").leftJustified(2028, '\0'));
+    }
+
+    void aLongWriteIsCutTo2028Bytes()
+    {
+        openPort();
+        QByteArray bytes(3000, 'a');
+        bytes[2027] = 'z';
+        QCOMPARE(port->write(bytes), 2028);
+        QTRY_COMPARE(peer->messages().size(), 1);
+        QCOMPARE(peer->messages().first().data, bytes.first(2028));
+        QCOMPARE(sourcedTexts(*log), QStringList());
+    }
+
+    void aWriteWithoutAFreeBufferFails()
+    {
+        openPort();
+        peer->setReading(false);
+        qint64 written = 1;
+        for (int attempt = 0; attempt < 10000 && written > 0; ++attempt)
+            written = port->write("x", 1);
+        QCOMPARE(written, -1);
+        QCOMPARE(sourcedTexts(*log), QStringList{"DspPort: MSGQ_alloc() failed. Status = 0x8000800c"});
+        peer->setReading(true);
+        QTRY_COMPARE(port->write("x", 1), 1);
+    }
+
+    void aWriteToALostDspIsFatalAndLosesNoBuffer()
+    {
+        openPort();
+        peer->hangUp();
+        QTRY_COMPARE(port->write("x", 1), -1);
+        (void)sourcedTexts(*log);
+        QStringList expected;
+        for (int attempt = 0; attempt < 30; ++attempt) {
+            QCOMPARE(port->write("x", 1), -1);
+            expected += "DspPort: MSGQ_put(this->privateData->dspMessageQueue, message.messageQueueMessage). Status = "
+                        "0x80008008";
+        }
+        QCOMPARE(sourcedTexts(*log), expected);
+    }
+
+    void aFatalWriteEndsTheRunningEventLoop()
+    {
+        openPort();
+        peer->hangUp();
+        QTRY_VERIFY(!peer->isConnected());
+        QTimer writing;
+        connect(&writing, &QTimer::timeout, this, [this] { port->write("x", 1); });
+        writing.start(10);
+        QCOMPARE(QCoreApplication::exec(), -1);
+    }
+
+    void oneReadReturnsOneMessage()
+    {
+        openPort();
+        for (const char fill : {'a', '\n', '\0'})
+            QVERIFY(peer->sendMessage(message(dataType, 40, fill)));
+        arrived(3);
+        for (const char fill : {'a', '\n', '\0'})
+            QCOMPARE(next(), message(dataType, 40, fill));
+        QVERIFY(announcer != QThread::currentThread());
+    }
+
+    void theLargestMessageIsOneRead()
+    {
+        openPort();
+        QVERIFY(peer->sendMessage(message(dataType, 2028)));
+        arrived(1);
+        QCOMPARE(next(), message(dataType, 2028));
+        QCOMPARE(port->bytesAvailable(), 0);
+    }
+
+    void aShortReadLeavesTheRestInFront()
+    {
+        openPort();
+        QByteArray data = message(dataType, 40);
+        for (int byte = 8; byte < 40; ++byte)
+            data[byte] = static_cast<char>(byte);
+        QVERIFY(peer->sendMessage(data));
+        QVERIFY(peer->sendMessage(message(dataType, 50)));
+        arrived(2);
+        char buffer[11]{};
+        QCOMPARE(port->readLine(buffer, 11), 10);
+        QCOMPARE(QByteArray(buffer, 10), data.first(10));
+        QCOMPARE(port->bytesAvailable(), 30);
+        QCOMPARE(port->readLine(buffer, 11), 10);
+        QCOMPARE(QByteArray(buffer, 10), data.sliced(10, 10));
+        QCOMPARE(next(), data.sliced(20));
+        QCOMPARE(next().size(), 50);
+    }
+
+    void bytesAvailableIsTheFirstMessageOnly()
+    {
+        openPort();
+        QCOMPARE(port->bytesAvailable(), 0);
+        for (int number = 0; number < 3; ++number)
+            QVERIFY(peer->sendMessage(message(dataType, 40)));
+        arrived(3);
+        QCOMPARE(port->bytesAvailable(), 40);
+    }
+
+    void readingWithNothingThereIsLogged()
+    {
+        openPort();
+        char buffer[11]{};
+        QCOMPARE(port->readLine(buffer, 11), 0);
+        QCOMPARE(sourcedTexts(*log), QStringList{"DspPort: Reading when no data available"});
+    }
+
+    void readingBeforeOpenAndAfterCloseFails()
+    {
+        makePort();
+        char buffer[11]{};
+        QCOMPARE(port->readLine(buffer, 11), -1);
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        port->close();
+        QCOMPARE(port->readLine(buffer, 11), -1);
+        (void)sourcedTexts(*log);
+    }
+
+    void aPortOpenedForWritingOnlyHasNoReadLoop()
+    {
+        makePort();
+        QVERIFY(port->open(QIODevice::WriteOnly));
+        QVERIFY(peer->sendMessage(message(dataType, 40)));
+        QCOMPARE(port->write("x", 1), 1);
+        QTRY_COMPARE(peer->messages().size(), 1);
+        QCOMPARE(announced.load(), 0);
+        QElapsedTimer timer;
+        timer.start();
+        port->close();
+        QVERIFY(timer.elapsed() < 4000);
+    }
+
+    void aForeignMessageIdIsLoggedAndDropped()
+    {
+        openPort();
+        for (const quint16 id : {quint16{0}, quint16{0x41}, quint16{65281}})
+            QVERIFY(peer->sendMessage(message(dataType, 40), id));
+        QVERIFY(peer->sendMessage(message(dataType, 48)));
+        arrived(1);
+        QCOMPARE(next().size(), 48);
+        QCOMPARE(sourcedTexts(*log), (QStringList{"DspPort: DspLink: Received message with invalid ID = 0",
+                                                  "DspPort: DspLink: Received message with invalid ID = 65",
+                                                  "DspPort: DspLink: Received message with invalid ID = 65281"}));
+    }
+
+    void droppedMessagesGiveTheirBuffersBack()
+    {
+        openPort();
+        for (int number = 0; number < 50; ++number)
+            QVERIFY(peer->sendMessage(QByteArray(2028, 'x'), 99));
+        QVERIFY(peer->sendMessage(message(dataType, 2028)));
+        arrived(1);
+        QCOMPARE(sourcedTexts(*log).size(), 50);
+        port->close();
+        QVERIFY(port->open(QIODevice::ReadWrite)); // POOL_open would report a pool that is still open with buffers out
+        QCOMPARE(port->write("x", 1), 1);
+    }
+
+    void aStatedLengthThatCannotBeIsLoggedAndCut_data()
+    {
+        QTest::addColumn<quint32>("payloadLength");
+        QTest::addColumn<int>("present");
+        QTest::addColumn<int>("delivered");
+        QTest::addColumn<QString>("logged");
+        QTest::newRow("2020 is the largest") << 2020U << 2028 << 2028 << "";
+        QTest::newRow("2092: data of 2100") << 2092U << 2028 << 2028 << "2100";
+        QTest::newRow("2100") << 2100U << 2028 << 2028 << "2108";
+        QTest::newRow("one too many") << 2021U << 2028 << 2028 << "2029";
+        QTest::newRow("does not wrap in 32 bits") << 0xFFFFFFFFU << 2028 << 2028 << "4294967303";
+        QTest::newRow("wraps to nothing in 32 bits") << 0xFFFFFFF8U << 2028 << 2028 << "4294967296";
+        QTest::newRow("negative when signed") << 0x80000000U << 2028 << 2028 << "2147483656";
+        QTest::newRow("more than the buffer holds") << 200U << 108 << 108 << "208";
+        QTest::newRow("far more than the buffer holds") << 0xFFFFFFFFU << 108 << 108 << "4294967303";
+        QTest::newRow("less than the buffer holds") << 4U << 108 << 12 << "";
+        QTest::newRow("no payload") << 0U << 2028 << 8 << "";
+    }
+
+    void aStatedLengthThatCannotBeIsLoggedAndCut()
+    {
+        QFETCH(const quint32, payloadLength);
+        QFETCH(const int, present);
+        QFETCH(const int, delivered);
+        QFETCH(const QString, logged);
+        openPort();
+        const QByteArray sent = DspPeer::words({dataType, payloadLength}).leftJustified(present, 'p');
+        QVERIFY(peer->sendMessage(sent));
+        arrived(1);
+        QCOMPARE(next(), sent.first(delivered));
+        QCOMPARE(sourcedTexts(*log),
+                 logged.isEmpty()
+                     ? QStringList()
+                     : QStringList{"DspPort: DspLink: Received message with invalid data length = " + logged});
+    }
+
+    void messagesShorterThanTheirWordsAreDeliveredAsTheyAre()
+    {
+        openPort();
+        const QByteArray whole = DspPeer::words({ackType, 0xFFFFFFFFU});
+        for (int size = 0; size < 8; ++size) {
+            QVERIFY(peer->sendMessage(whole.first(size)));
+            arrived(size + 1);
+            QCOMPARE(port->bytesAvailable(), size);
+            char buffer[64]{};
+            QCOMPARE(port->readLine(buffer, sizeof buffer), size);
+            QCOMPARE(QByteArray(buffer, size), whole.first(size));
+        }
+        QCOMPARE(sourcedTexts(*log), QStringList());
+    }
+
+    void anAcknowledgementOvertakesWaitingData()
+    {
+        openPort();
+        for (int number = 0; number < 50; ++number)
+            QVERIFY(peer->sendMessage(message(dataType, 40)));
+        QVERIFY(peer->sendMessage(message(nakType, 12)));
+        QVERIFY(peer->sendMessage(message(ackType, 12)));
+        arrived(52);
+        QCOMPARE(next(), message(ackType, 12));
+        for (int number = 0; number < 50; ++number)
+            QCOMPARE(next(), message(dataType, 40));
+        QCOMPARE(next(), message(nakType, 12));
+    }
+
+    void theFullWarningIsGivenOnceAnExcursion()
+    {
+        openPort();
+        const QStringList warning{"DspPort: DSP data buffer too large"};
+        int sent = 0;
+        const auto send = [&](int count) {
+            for (int number = 0; number < count; ++number)
+                QVERIFY(peer->sendMessage(message(dataType, 8)));
+            sent += count;
+            arrived(sent);
+        };
+        send(100);
+        QCOMPARE(sourcedTexts(*log), QStringList());
+        send(1);
+        QCOMPARE(sourcedTexts(*log), warning);
+        send(50);
+        for (int number = 0; number < 120; ++number) // leaves 31
+            QCOMPARE(next().size(), 8);
+        send(1); // 32: still the same excursion
+        send(100);
+        QCOMPARE(sourcedTexts(*log), QStringList());
+        for (int number = 0; number < 103; ++number) // leaves 29
+            QCOMPARE(next().size(), 8);
+        send(1); // 30: over
+        send(70);
+        QCOMPARE(sourcedTexts(*log), QStringList());
+        send(1); // 101
+        QCOMPARE(sourcedTexts(*log), warning);
+        for (int number = 0; number < 101; ++number) // nothing was dropped
+            QCOMPARE(next().size(), 8);
+    }
+
+    void aSecondOpenFindsTheReadThreadBusy()
+    {
+        openPort();
+        QVERIFY(!port->open(QIODevice::ReadWrite));
+        const QStringList texts = sourcedTexts(*log);
+        QCOMPARE(texts.last(), "DspPort: Previous read thread is not finished.");
+        QVERIFY(!texts.contains(openTexts.at(1)));
+    }
+
+    void closingTearsDownInOrderAndReopeningRepeatsTheLoad()
+    {
+        openPort();
+        port->close();
+        QVERIFY(!port->isOpen());
+        const QList<DspPeer::Kind> closing{DspPeer::TransportClose, DspPeer::Stop, DspPeer::QueueClose,
+                                           DspPeer::Detach};
+        QCOMPARE(peer->requestKinds().mid(6), closing);
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        QCOMPARE(peer->requestKinds().mid(10),
+                 (QList<DspPeer::Kind>{DspPeer::Attach, DspPeer::QueueOpen, DspPeer::Load, DspPeer::Start,
+                                       DspPeer::TransportOpen, DspPeer::Locate}));
+        QCOMPARE(sourcedTexts(*log), openTexts);
+        QVERIFY(peer->sendMessage(message(dataType, 40)));
+        arrived(1);
+        QCOMPARE(next().size(), 40);
+        port.reset(); // closes
+        QCOMPARE(peer->requestKinds().mid(16), closing);
+        QCOMPARE(sourcedTexts(*log), QStringList());
+    }
+
+    void closingAtOnceAfterOpeningEnds()
+    {
+        makePort();
+        for (int round = 0; round < 20; ++round) {
+            QVERIFY(port->open(QIODevice::ReadWrite));
+            QElapsedTimer timer;
+            timer.start();
+            port->close();
+            QVERIFY(timer.elapsed() < 4000);
+        }
+        QVERIFY(!sourcedTexts(*log).contains("DspPort: Read thread took too long to finish"));
+    }
+
+    void closingWhileDataArriveIsClean()
+    {
+        std::atomic<bool> sending = true;
+        auto sender = std::async(std::launch::async, [&] {
+            while (sending) {
+                if (!peer->sendMessage(message(dataType, 2028)))
+                    QThread::msleep(1);
+            }
+        });
+        const auto end = qScopeGuard([&] { sending = false; });
+        for (int round = 0; round < 5; ++round) {
+            makePort();
+            QVERIFY(port->open(QIODevice::ReadWrite));
+            QTRY_VERIFY(announced > 20);
+            port->close();
+            port.reset();
+        }
+    }
+
+    void aBurstOfAThousandLosesNothing()
+    {
+        openPort();
+        for (quint32 number = 0; number < 1000; ++number)
+            QVERIFY(peer->sendMessage(DspPeer::words({dataType, 4, number})));
+        arrived(1000);
+        for (quint32 number = 0; number < 1000; ++number)
+            QCOMPARE(next(), DspPeer::words({dataType, 4, number}));
+    }
+};
+
+QTEST_GUILESS_MAIN(DspPortTest)
+#include "DspPortTest.moc"
