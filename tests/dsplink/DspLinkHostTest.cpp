@@ -605,6 +605,8 @@ private slots:
         QVERIFY(peer->sendMessage("unfetched"));
         QCOMPARE(bits(MSGQ_transportClose(0)), 0x800DU);
         QVERIFY(peer->sendMessage("too late"));
+        MSGQ_Queue other = 0;
+        QCOMPARE(bits(openQueue("other", &other)), 0x8000U); // its reply comes after that message
         MSGQ_Msg message = nullptr;
         QCOMPARE(bits(MSGQ_get(hostQueue, WAIT_FOREVER, &message)), 0x80008008U);
         QCOMPARE(bits(MSGQ_transportOpen(0, &transport)), 0x8000U);

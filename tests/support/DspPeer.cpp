@@ -162,7 +162,7 @@ void DspPeer::handleRequest(Kind kind, quint32 serial, const QByteArray& payload
     {
         const std::lock_guard lock(mutex);
         seenRequests.append({kind, payload});
-        if (kind == QueueOpen)
+        if (kind == QueueOpen && payload.mid(4) == "GPPMSGQ1")
             queueOfHost = numberOf<quint32>(payload, 0);
         if (silent.contains(kind)) {
             if (kind == Locate)
