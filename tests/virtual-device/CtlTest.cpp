@@ -22,6 +22,11 @@ namespace
 
 constexpr int limit = 20000;
 
+QString program()
+{
+    return qEnvironmentVariable("IMMUNITYRIG_BUILD") + "/virtual-device/virtual-device";
+}
+
 struct Result
 {
     int status = -1;
@@ -41,8 +46,7 @@ public:
         else
             environment.insert("VIRTUAL_DEVICE_CONTROL", socket);
         process.setProcessEnvironment(environment);
-        process.start(qEnvironmentVariable("IMMUNITYRIG_BUILD") + "/virtual-device/virtual-device",
-                      QStringList("ctl") + arguments);
+        process.start(program(), QStringList("ctl") + arguments);
     }
 
     bool waitForOutput(const QString& text)
@@ -96,6 +100,7 @@ private slots:
     void waitForALogText();
     void logPrintsWhatIsThere();
     void logFollowPrintsEachLineOnceAndEndsWithTheDevice();
+    void logFollowEndsWhenNobodyReadsIt();
     void eventsArePrintedAsTheyCome();
     void onlyRunningDeviceIsFoundByItself();
     void withoutADeviceItSaysSo();
@@ -310,6 +315,24 @@ void CtlTest::logFollowPrintsEachLineOnceAndEndsWithTheDevice()
     QCOMPARE(result.output.count('\n'), 100);
     for (int number = 1; number <= 100; ++number)
         QCOMPARE(result.output.count(QString("line %1.").arg(number)), 1);
+}
+
+void CtlTest::logFollowEndsWhenNobodyReadsIt()
+{
+    QVERIFY(log("line 1."));
+    auto environment = QProcessEnvironment::systemEnvironment();
+    environment.insert("VIRTUAL_DEVICE_CONTROL", bench->socketPath());
+    QProcess shell;
+    shell.setProcessEnvironment(environment);
+    // The shell waits for both.
+    shell.start("sh", {"-c", "\"$0\" ctl log --follow | head -n 1", program()});
+    QVERIFY(QTest::qWaitFor(
+        [&] {
+            static_cast<void>(log("more"));
+            return shell.state() == QProcess::NotRunning;
+        },
+        limit));
+    QVERIFY(shell.readAllStandardOutput().endsWith("VQK: line 1.\n"));
 }
 
 void CtlTest::eventsArePrintedAsTheyCome()

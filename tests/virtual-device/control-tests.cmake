@@ -14,9 +14,11 @@ immunityrig_test(ScreenTest
   LIBRARIES VirtualDevice LABELS unit)
 add_dependencies(ScreenTest WindowSample)
 immunityrig_test(RegistryTest SOURCES virtual-device/RegistryTest.cpp LIBRARIES VirtualDevice LABELS unit)
-immunityrig_test(ControlServerTest
-  SOURCES virtual-device/ControlServerTest.cpp virtual-device/ControlBench.cpp virtual-device/ControlBench.h
-  LIBRARIES VirtualDevice LABELS unit)
+foreach(test ControlServerTest ControlWaitTest)
+  immunityrig_test(${test}
+    SOURCES virtual-device/${test}.cpp virtual-device/ControlBench.cpp virtual-device/ControlBench.h
+    LIBRARIES VirtualDevice LABELS unit)
+endforeach()
 immunityrig_test(RegionMapTest SOURCES virtual-device/RegionMapTest.cpp LIBRARIES VirtualDevice LABELS unit)
 set_target_properties(RegionMapTest PROPERTIES AUTOUIC_SEARCH_PATHS "${PROJECT_SOURCE_DIR}")
 immunityrig_test(CtlTest
@@ -34,3 +36,6 @@ foreach(property TIMEOUT LABELS ENVIRONMENT)
   get_test_property(DeviceControlTest ${property} value)
   set_tests_properties(DeviceControlTestAsOrdinaryUser PROPERTIES ${property} "${value}")
 endforeach()
+
+immunityrig_test(DocumentationTest SOURCES virtual-device/DocumentationTest.cpp LIBRARIES VirtualDevice LABELS unit)
+target_compile_definitions(DocumentationTest PRIVATE SOURCE_FOLDER="${PROJECT_SOURCE_DIR}")
