@@ -10,24 +10,59 @@
 
 #include <dlfcn.h>
 
+#include <condition_variable>
+#include <mutex>
+
 namespace TestSupport
 {
+
+namespace
+{
+
+/// Without captures, which the pool would hand over out of the thread sanitizer's sight.
+struct Gate
+{
+    std::mutex mutex;
+    std::condition_variable changed;
+    int running = 0;
+    bool isOpen = false;
+};
+
+Gate& gate()
+{
+    static Gate instance;
+    return instance;
+}
+
+void waitAtTheGate()
+{
+    std::unique_lock lock(gate().mutex);
+    ++gate().running;
+    gate().changed.notify_all();
+    gate().changed.wait(lock, [] { return gate().isOpen; });
+    --gate().running;
+    gate().changed.notify_all();
+}
+
+} // namespace
 
 PoolHold::PoolHold()
 {
     auto* const pool = QThreadPool::globalInstance();
-    const auto running = std::make_shared<QSemaphore>();
-    for (; held < pool->maxThreadCount(); ++held)
-        pool->start([running, waiting = gate] {
-            running->release();
-            waiting->acquire();
-        });
-    running->acquire(held);
+    const int threads = pool->maxThreadCount();
+    std::unique_lock lock(gate().mutex);
+    gate().isOpen = false;
+    for (int held = 0; held < threads; ++held)
+        pool->start(waitAtTheGate);
+    gate().changed.wait(lock, [&] { return gate().running == threads; });
 }
 
 PoolHold::~PoolHold()
 {
-    gate->release(held);
+    std::unique_lock lock(gate().mutex);
+    gate().isOpen = true;
+    gate().changed.notify_all();
+    gate().changed.wait(lock, [] { return gate().running == 0; });
 }
 
 void* nextSymbol(const char* name)

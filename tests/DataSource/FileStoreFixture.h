@@ -8,7 +8,6 @@
 
 #include <QDir>
 #include <QObject>
-#include <QSemaphore>
 #include <QTemporaryDir>
 
 #include <memory>
@@ -17,6 +16,7 @@ namespace TestSupport
 {
 
 /// Keeps every thread of the global pool busy, so that what is started meanwhile waits until the hold goes.
+/// One at a time.
 class PoolHold
 {
 public:
@@ -24,10 +24,6 @@ public:
     ~PoolHold();
     PoolHold(const PoolHold&) = delete;
     PoolHold& operator=(const PoolHold&) = delete;
-
-private:
-    std::shared_ptr<QSemaphore> gate = std::make_shared<QSemaphore>();
-    int held = 0;
 };
 
 /// The C library's own version of a function that a test program replaces.
