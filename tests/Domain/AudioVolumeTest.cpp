@@ -147,7 +147,7 @@ void AudioVolumeTest::unusableStoredVolumes_data()
     QTest::addRow("fraction") << "4.5"
                               << "0 0 1" << QStringList();
     QTest::addRow("beyond 32 bits") << "99999999999"
-                                    << "0 0 1" << QStringList();
+                                    << "60 60 1" << QStringList{tooHigh(1215752191)};
     QTest::addRow("blanks") << " 2 "
                             << "20 20 1" << QStringList();
     QTest::addRow("too low") << "-9"
