@@ -41,6 +41,7 @@ private slots:
     void fullRefusesGrowthAndStillReadsAndRemoves();
     void failureFailsEverything_data();
     void failureFailsEverything();
+    void unmountClosesWhatIsStillOpen();
     void folderThatDoesNotExistIsReported();
 
 private:
@@ -244,6 +245,23 @@ void DataPartitionTest::failureFailsEverything()
     QVERIFY(QFileInfo(mountPoint->path()).isDir()); // the mount itself stays
     set("sd.fault", "none");
     QCOMPARE(read(at("a")), "content");
+}
+
+void DataPartitionTest::unmountClosesWhatIsStillOpen()
+{
+    const auto descriptors = [] { return QDir("/proc/self/fd").entryList(QDir::AllEntries | QDir::System).size(); };
+    partition->unmount();
+    const auto before = descriptors();
+    QCOMPARE(partition->mount(folder->path(), mountPoint->path()), std::nullopt);
+    write(at("a"), "content");
+    {
+        RawFile file(at("a"), O_RDWR);
+        const RawFile open(mountPoint->path(), O_RDONLY | O_DIRECTORY);
+        partition->unmount();
+        file.read(100);
+        QVERIFY(file.error() != 0);
+    }
+    QCOMPARE(descriptors(), before);
 }
 
 void DataPartitionTest::folderThatDoesNotExistIsReported()

@@ -6,7 +6,6 @@
 #include "virtual-device/registry/Registry.h"
 #include "virtual-device/tree/Faults.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/statvfs.h>
@@ -14,6 +13,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <utility>
 
 namespace VirtualDevice
 {
@@ -52,10 +52,7 @@ bool changes(int flags)
 /// The bridge from the library's C functions. Paths never hold a link: the kernel has followed them already.
 struct PartitionOperations
 {
-    static const DataPartition& card()
-    {
-        return *static_cast<const DataPartition*>(::fuse_get_context()->private_data);
-    }
+    static DataPartition& card() { return *static_cast<DataPartition*>(::fuse_get_context()->private_data); }
     static int root() { return card().root; }
 
     /// Runs `action` unless the card refuses with `refusal`.
@@ -98,7 +95,9 @@ struct PartitionOperations
         const int descriptor = ::openat(root(), below(path), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
         if (descriptor < 0)
             return -errno;
-        info->fh = reinterpret_cast<std::uintptr_t>(::fdopendir(descriptor));
+        DIR* folder = ::fdopendir(descriptor);
+        card().openFolders.insert(folder);
+        info->fh = reinterpret_cast<std::uintptr_t>(folder);
         return 0;
     }
 
@@ -106,8 +105,8 @@ struct PartitionOperations
 
     static int releasedir(const char*, fuse_file_info* info)
     {
-        ::closedir(folderOf(info));
-        return 0;
+        card().openFolders.erase(folderOf(info));
+        return outcome(::closedir(folderOf(info)));
     }
 
     static int readdir(const char*, void* buffer, fuse_fill_dir_t fill, off_t, fuse_file_info* info, fuse_readdir_flags)
@@ -185,6 +184,7 @@ struct PartitionOperations
         const int descriptor = ::openat(root(), below(path), flags | O_CLOEXEC | O_NOFOLLOW, mode);
         if (descriptor < 0)
             return -errno;
+        card().openFiles.insert(descriptor);
         info->fh = static_cast<std::uint64_t>(descriptor);
         return 0;
     }
@@ -203,8 +203,8 @@ struct PartitionOperations
 
     static int release(const char*, fuse_file_info* info)
     {
-        ::close(descriptorOf(info));
-        return 0;
+        card().openFiles.erase(descriptorOf(info));
+        return outcome(::close(descriptorOf(info)));
     }
 
     static int read(const char*, char* buffer, size_t size, off_t offset, fuse_file_info* info)
@@ -275,6 +275,10 @@ std::optional<QString> DataPartition::mount(const QString& folder, const QString
 void DataPartition::unmount()
 {
     fileSystem.unmount();
+    for (const int file : std::exchange(openFiles, {}))
+        ::close(file);
+    for (DIR* folder : std::exchange(openFolders, {}))
+        ::closedir(folder);
     if (root >= 0)
         ::close(root);
     root = -1;

@@ -7,6 +7,10 @@
 
 #include <QString>
 
+#include <dirent.h>
+
+#include <set>
+
 namespace VirtualDevice
 {
 
@@ -16,8 +20,8 @@ class Registry;
 /// card can turn read-only (`sd.readonly`: EROFS), run full (`sd.full`: ENOSPC) or fail (`sd.fault`) while it is in
 /// use.
 ///
-/// Not supported: `fstat` of a file that was removed while it is open (ENOENT; reading, writing and truncating it work),
-/// owners, and extended attributes.
+/// Not supported: `fstat` of a file that was removed while it is open (ENOENT; reading, writing and truncating it
+/// work), owners, and extended attributes.
 ///
 /// Threads: as FuseMount.
 class DataPartition
@@ -41,6 +45,9 @@ private:
 
     const Registry& registry;
     int root = -1;
+    /// For the mount's thread. What is still open when the mount goes, is closed with it.
+    std::set<int> openFiles;
+    std::set<DIR*> openFolders;
     FuseMount fileSystem;
 };
 

@@ -18,14 +18,6 @@
 namespace VirtualDevice
 {
 
-/// What the kernel keeps for an open attribute: the value as it was when it was read from its start.
-struct DeviceTree::OpenFile
-{
-    const TreeEntry* entry = nullptr;
-    QByteArray content;
-    bool isFilled = false;
-};
-
 namespace
 {
 
@@ -98,10 +90,7 @@ QString stamp(const QDateTime& time)
 struct TreeOperations
 {
     static DeviceTree& tree() { return *static_cast<DeviceTree*>(::fuse_get_context()->private_data); }
-    static DeviceTree::OpenFile& file(fuse_file_info* info)
-    {
-        return *reinterpret_cast<DeviceTree::OpenFile*>(info->fh);
-    }
+    static DeviceTree::OpenFile& file(fuse_file_info* info) { return tree().openFiles.at(info->fh); }
 
     static int getattr(const char* path, struct stat* status, fuse_file_info*)
     {
@@ -149,14 +138,16 @@ struct TreeOperations
         if (entry == nullptr)
             return -ENOENT;
         const int error = tree().open(*entry, info->flags);
-        if (error == 0)
-            info->fh = reinterpret_cast<std::uintptr_t>(new DeviceTree::OpenFile{entry, {}, false});
-        return -error;
+        if (error != 0)
+            return -error;
+        info->fh = ++tree().lastHandle;
+        tree().openFiles[info->fh].entry = entry;
+        return 0;
     }
 
     static int release(const char*, fuse_file_info* info)
     {
-        delete &file(info);
+        tree().openFiles.erase(info->fh);
         return 0;
     }
 
@@ -242,6 +233,7 @@ std::optional<QString> DeviceTree::mount(const QString& mountPoint)
 void DeviceTree::unmount()
 {
     fileSystem.unmount();
+    openFiles.clear();
 }
 
 int DeviceTree::fault(const TreeEntry& entry) const

@@ -12,6 +12,9 @@
 #include <QObject>
 #include <QString>
 
+#include <cstdint>
+#include <map>
+
 namespace VirtualDevice
 {
 
@@ -45,7 +48,14 @@ signals:
 
 private:
     friend struct TreeOperations;
-    struct OpenFile;
+
+    /// What the kernel keeps for an open attribute: the value as it was when it was read from its start.
+    struct OpenFile
+    {
+        const TreeEntry* entry = nullptr;
+        QByteArray content;
+        bool isFilled = false;
+    };
 
     [[nodiscard]] int fault(const TreeEntry& entry) const;
     [[nodiscard]] bool isThere(const TreeEntry& entry) const;
@@ -59,6 +69,9 @@ private:
 
     Registry& registry;
     RealTimeClock clock;
+    /// By handle; for the mount's thread. What is still open when the mount goes, goes with it.
+    std::map<std::uint64_t, OpenFile> openFiles;
+    std::uint64_t lastHandle = 0;
     FuseMount fileSystem;
 };
 
