@@ -4,9 +4,16 @@
 #include "presentation/TestGui.h"
 
 #include "DataSource/src/AbstractDataSourceLayer.h"
+#include "Domain/src/DomainLayer/Audio.h"
+#include "Domain/src/DomainLayer/BeaconProcessor.h"
 #include "Domain/src/DomainLayer/Buttons.h"
+#include "Domain/src/DomainLayer/Dsp.h"
+#include "Domain/src/DomainLayer/DspPort.h"
+#include "Domain/src/DomainLayer/SerialPort.h"
+#include "presentation/AudioTest.h"
 #include "presentation/ButtonsTest.h"
 #include "presentation/FuelGuageTest.h"
+#include "presentation/RfTest.h"
 #include "presentation/RtcTest.h"
 #include "presentation/SdCardTest.h"
 #include "presentation/TriggerTest.h"
@@ -21,6 +28,8 @@ namespace
 {
 
 constexpr QRect screenRectangle(0, 0, 240, 320);
+const QString beaconSerialPortName = QStringLiteral("/dev/ttyS1");
+const QString dspExecutablePath = QStringLiteral("/dsp.out");
 
 void place(QWidget& test, const QWidget* region)
 {
@@ -33,17 +42,27 @@ void place(QWidget& test, const QWidget* region)
 struct TestGui::PrivateData
 {
     PrivateData(TestGui& testGui, DataSource::AbstractDataSourceLayer& layer, QWidget* parent);
+    ~PrivateData();
+    Q_DISABLE_COPY_MOVE(PrivateData)
 
     void startTests();
+    void connectRfTest();
 
     TestGui& owner;
     QWidget screen;
     Ui_TestGui ui{};
     DataSource::AbstractDataSourceLayer& dataSourceLayer;
+    Domain::SerialPort serialPort;
+    Domain::Audio audio;
+    Domain::BeaconProcessor beaconProcessor;
     Domain::Buttons buttons;
+    Domain::DspPort dspPort;
+    Domain::Dsp dsp;
+    AudioTest audioTest;
     RtcTest rtcTest;
-    ButtonsTest buttonsTest;
+    ButtonsTest buttonsTest; ///< built after `buttons`, so that its grab of the keyboard is the one in force
     UsbDeviceTest usbDeviceTest;
+    RfTest rfTest;
     FuelGuageTest fuelGaugeTest;
     UsbGadgetTest usbGadgetTest;
     TriggerTest triggerTest;
@@ -54,10 +73,17 @@ TestGui::PrivateData::PrivateData(TestGui& testGui, DataSource::AbstractDataSour
     : owner(testGui),
       screen(parent),
       dataSourceLayer(layer),
+      serialPort(beaconSerialPortName, Domain::SerialPort::Baud115200),
+      audio(dataSourceLayer.configurationData()),
+      beaconProcessor(serialPort),
       buttons(dataSourceLayer.configurationData()),
+      dspPort(dspExecutablePath),
+      dsp(dspPort, buttons),
+      audioTest(audio),
       rtcTest(&screen),
       buttonsTest(&screen),
       usbDeviceTest(&screen),
+      rfTest(beaconProcessor, dsp, &screen),
       fuelGaugeTest(&screen),
       usbGadgetTest(&screen),
       triggerTest(&screen),
@@ -68,13 +94,24 @@ TestGui::PrivateData::PrivateData(TestGui& testGui, DataSource::AbstractDataSour
     startTests();
 }
 
+TestGui::PrivateData::~PrivateData()
+{
+    audioTest.stop();
+}
+
 void TestGui::PrivateData::startTests()
 {
+    audioTest.start();
     place(rtcTest, ui.rtcTestRegion);
     rtcTest.start();
     place(buttonsTest, ui.buttonsTestWidget);
     place(usbDeviceTest, ui.usbDeviceTestWidget);
     usbDeviceTest.start();
+    dsp.setReceiverEnableTest(1);
+    dsp.runHardwareTest(1);
+    place(rfTest, ui.rfTestWidget);
+    rfTest.start();
+    connectRfTest();
     place(fuelGaugeTest, ui.fuelGaugeWidget);
     fuelGaugeTest.start();
     place(usbGadgetTest, ui.usbGadgetTestWidget);
@@ -84,6 +121,17 @@ void TestGui::PrivateData::startTests()
     connect(&buttonsTest, &ButtonsTest::triggerPressed, &triggerTest, &TriggerTest::triggerInput);
     place(sdCardTest, ui.sdCardTestWidget);
     sdCardTest.start();
+}
+
+void TestGui::PrivateData::connectRfTest()
+{
+    connect(&buttonsTest, &ButtonsTest::downPressed, &rfTest, &RfTest::frequencyDown);
+    connect(&buttonsTest, &ButtonsTest::upPressed, &rfTest, &RfTest::frequencyUp);
+    connect(&buttonsTest, &ButtonsTest::leftPressed, &rfTest, &RfTest::powerLevelDown);
+    connect(&buttonsTest, &ButtonsTest::rightPressed, &rfTest, &RfTest::powerLevelUp);
+    connect(&buttonsTest, &ButtonsTest::enterPressed, &rfTest, &RfTest::toggleState);
+    connect(&buttonsTest, &ButtonsTest::soft3Pressed, &rfTest, &RfTest::toggleExternalAntenna);
+    connect(&buttonsTest, &ButtonsTest::radioPressed, &rfTest, &RfTest::radioResponseReceived);
 }
 
 TestGui::TestGui(DataSource::AbstractDataSourceLayer& dataSourceLayer, QWidget* parent)
