@@ -7,6 +7,7 @@
 #include "utilities/Debug.h"
 
 #include <QApplication>
+#include <QFont>
 
 #include <csignal>
 
@@ -23,6 +24,16 @@ void prepareProcess()
     QCoreApplication::addLibraryPath(QStringLiteral(IMMUNITYRIG_QT_PLUGINS));
     // The framebuffer plugin would stretch the window to the screen; the layout is made of pixels and stays as it is.
     qputenv("QT_QPA_FB_FORCE_FULLSCREEN", "0");
+    // A point stays as many pixels as the layout was made for, whatever the display says of its size.
+    qputenv("QT_FONT_DPI", "96");
+}
+
+/// The regions have room for text of this size; the toolkit's own default is larger on some platforms.
+void setDefaultFont()
+{
+    QFont font = QApplication::font();
+    font.setPointSize(9);
+    QApplication::setFont(font);
 }
 
 void run(int argc, char** argv)
@@ -30,6 +41,7 @@ void run(int argc, char** argv)
     QApplication application(argc, argv);
     // A closed window does not end the run: the log's fatal messages and the termination signals do.
     QApplication::setQuitOnLastWindowClosed(false);
+    setDefaultFont();
     const Presentation::TerminationSignals terminationSignals;
     DataSource::DataSourceLayer dataSourceLayer(QStringLiteral("/"));
     Presentation::TestGui testGui(dataSourceLayer);
