@@ -4,6 +4,7 @@
 add_library(PresentationTestSupport STATIC
   presentation/DebugOutput.cpp presentation/DebugOutput.h
   presentation/LabelForm.cpp presentation/LabelForm.h
+  presentation/ObjectRecorder.cpp presentation/ObjectRecorder.h
   presentation/RecordingBeacon.cpp presentation/RecordingBeacon.h
   presentation/WidgetProbe.cpp presentation/WidgetProbe.h)
 target_link_libraries(PresentationTestSupport PUBLIC TestSupport Domain)
@@ -15,6 +16,8 @@ foreach(test IN ITEMS
   immunityrig_test(${test} SOURCES presentation/${test}.cpp LIBRARIES PresentationTestSupport Presentation LABELS presentation)
 endforeach()
 immunityrig_test(TestGuiTest SOURCES presentation/TestGuiTest.cpp
+  LIBRARIES PresentationTestSupport Presentation LABELS presentation)
+immunityrig_test(AssemblyTest SOURCES presentation/AssemblyTest.cpp
   LIBRARIES PresentationTestSupport Presentation LABELS presentation)
 immunityrig_test(ResourcesTest
   SOURCES presentation/ResourcesTest.cpp "${PROJECT_SOURCE_DIR}/resources/Target.qrc"
