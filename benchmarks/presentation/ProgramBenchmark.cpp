@@ -1,0 +1,133 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "benchmarks/presentation/FirstFrame.h"
+#include "benchmarks/presentation/Process.h"
+
+#include <benchmark/benchmark.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <thread>
+#include <vector>
+
+/// The program on a healthy virtual device beside a minimal Qt window, both in the same run: start to the first
+/// complete frame, resident memory, processor time and wake-ups of the running programs. The ratios are the program's
+/// figure over the minimal window's; `wakeups_to_implied` is over what the program's own intervals imply.
+namespace
+{
+
+using namespace std::chrono_literals;
+using Benchmarks::Process;
+using Clock = std::chrono::steady_clock;
+
+constexpr const char* insideVariable = "VIRTUAL_DEVICE_CONTROL";
+constexpr auto settling = 5s;
+constexpr auto observation = 60s;
+
+/// Five polls, the sound's check, the transmission's indicator, the ping, two reading threads' half-second waits.
+constexpr double impliedWakeUpsPerSecond = 5 + 1 + 2 + 1.0 / 3 + 2 * 2;
+
+std::filesystem::path buildFolder()
+{
+    return std::filesystem::read_symlink("/proc/self/exe").parent_path().parent_path();
+}
+
+const std::string program = buildFolder() / "presentation/immunityrig";
+const std::string minimalWindow = buildFolder() / "benchmarks/MinimalWindow";
+
+double secondsToFirstFrame(const std::string& path, benchmark::State& state)
+{
+    static int port = 5950;
+    ++port;
+    const auto start = Clock::now();
+    const Process process(path, "vnc:size=240x320:port=" + std::to_string(port));
+    if (!Benchmarks::waitForFirstFrame(port))
+        state.SkipWithError("no complete frame");
+    return std::chrono::duration<double>(Clock::now() - start).count();
+}
+
+void startToFirstFrame(benchmark::State& state)
+{
+    double minimalSeconds = 0;
+    double programSeconds = 0;
+    for ([[maybe_unused]] auto iteration : state) {
+        minimalSeconds += secondsToFirstFrame(minimalWindow, state);
+        const double seconds = secondsToFirstFrame(program, state);
+        programSeconds += seconds;
+        state.SetIterationTime(seconds);
+    }
+    state.counters["minimal_ms"] = benchmark::Counter(1000 * minimalSeconds, benchmark::Counter::kAvgIterations);
+    state.counters["start_ratio"] = programSeconds / minimalSeconds;
+}
+
+struct Difference
+{
+    double cpuSeconds;
+    double wakeUps;
+    double residentKilobytes;
+};
+
+Difference difference(const Benchmarks::Usage& before, const Benchmarks::Usage& after)
+{
+    return {std::chrono::duration<double>(after.cpu - before.cpu).count(),
+            static_cast<double>(after.wakeUps - before.wakeUps), static_cast<double>(after.residentKilobytes)};
+}
+
+void running(benchmark::State& state)
+{
+    for ([[maybe_unused]] auto iteration : state) {
+        const Process minimal(minimalWindow, "offscreen");
+        const Process measured(program, "offscreen");
+        std::this_thread::sleep_for(settling);
+        const auto minimalBefore = minimal.usage();
+        const auto measuredBefore = measured.usage();
+        std::this_thread::sleep_for(observation);
+        const auto baseline = difference(minimalBefore, minimal.usage());
+        const auto used = difference(measuredBefore, measured.usage());
+        if (!minimal.isRunning() || !measured.isRunning())
+            state.SkipWithError("a program ended");
+        constexpr double seconds = std::chrono::duration<double>(observation).count();
+        state.SetIterationTime(seconds);
+        state.counters["cpu_ms_a_minute"] = 1000 * used.cpuSeconds;
+        state.counters["cpu_ratio"] = used.cpuSeconds / baseline.cpuSeconds;
+        state.counters["memory_MiB"] = used.residentKilobytes / 1024;
+        state.counters["memory_ratio"] = used.residentKilobytes / baseline.residentKilobytes;
+        state.counters["wakeups_a_second"] = used.wakeUps / seconds;
+        state.counters["minimal_wakeups_a_second"] = baseline.wakeUps / seconds;
+        state.counters["wakeups_to_implied"] = used.wakeUps / seconds / impliedWakeUpsPerSecond;
+    }
+}
+
+BENCHMARK(startToFirstFrame)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(10);
+BENCHMARK(running)->UseManualTime()->Unit(benchmark::kSecond)->Iterations(1);
+
+/// Starts itself again in the sandbox of a virtual device, where the program finds its devices.
+void enterDevice(char** argv)
+{
+    const std::string device = buildFolder() / "virtual-device/virtual-device";
+    const std::string self = std::filesystem::read_symlink("/proc/self/exe");
+    std::vector<const char*> arguments{device.c_str(), "exec", "--", self.c_str()};
+    for (char** argument = argv + 1; *argument != nullptr; ++argument)
+        arguments.push_back(*argument);
+    arguments.push_back(nullptr);
+    ::execv(device.c_str(), const_cast<char* const*>(arguments.data()));
+    std::perror(device.c_str());
+    std::exit(EXIT_FAILURE);
+}
+
+} // namespace
+
+int main(int argc, char** argv)
+{
+    if (std::getenv(insideVariable) == nullptr)
+        enterDevice(argv);
+    benchmark::Initialize(&argc, argv);
+    if (benchmark::ReportUnrecognizedArguments(argc, argv))
+        return EXIT_FAILURE;
+    benchmark::RunSpecifiedBenchmarks();
+    return EXIT_SUCCESS;
+}
