@@ -7,3 +7,10 @@ immunityrig_test(DspCodecTest SOURCES virtual-device/DspCodecTest.cpp LIBRARIES 
 immunityrig_test(DspModelTest SOURCES virtual-device/DspModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(SoundMatcherTest SOURCES virtual-device/SoundMatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(AudioWatcherTest SOURCES virtual-device/AudioWatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)
+
+# The program's classes against the device's models: two sides that share no code.
+immunityrig_test(RadioCrossCheckTest SOURCES virtual-device/RadioCrossCheckTest.cpp LIBRARIES Domain VirtualDevice
+  LABELS unit)
+immunityrig_test(AudioCrossCheckTest SOURCES virtual-device/AudioCrossCheckTest.cpp LIBRARIES Domain VirtualDevice
+  LABELS unit)
+target_compile_definitions(AudioCrossCheckTest PRIVATE MIXER_PLUGIN="$<TARGET_FILE:MixerPlugin>")
