@@ -14,3 +14,8 @@ immunityrig_test(RadioCrossCheckTest SOURCES virtual-device/RadioCrossCheckTest.
 immunityrig_test(AudioCrossCheckTest SOURCES virtual-device/AudioCrossCheckTest.cpp LIBRARIES Domain VirtualDevice
   LABELS unit)
 target_compile_definitions(AudioCrossCheckTest PRIVATE MIXER_PLUGIN="$<TARGET_FILE:MixerPlugin>")
+# The maker's library needs the maker's hardware.
+if(NOT DSPLINK_ROOT)
+  immunityrig_test(DspCrossCheckTest SOURCES virtual-device/DspCrossCheckTest.cpp LIBRARIES Domain VirtualDevice
+    LABELS unit)
+endif()

@@ -1,0 +1,261 @@
+// SPDX-FileCopyrightText: 2026 The ImmunityRig developers
+// SPDX-License-Identifier: MIT
+
+#include "Domain/src/DomainLayer/AbstractButtons.h"
+#include "Domain/src/DomainLayer/Dsp.h"
+#include "Domain/src/DomainLayer/DspPort.h"
+#include "tests/support/LogCapture.h"
+#include "tests/virtual-device/ModelThread.h"
+#include "virtual-device/dsp/DspModel.h"
+#include "virtual-device/dsp/SensorFrame.h"
+#include "virtual-device/registry/Registry.h"
+
+#include <QElapsedTimer>
+#include <QFile>
+#include <QTest>
+
+#include <mutex>
+
+using namespace VirtualDevice;
+
+namespace
+{
+
+const QString image = QStringLiteral("/dsp.out");
+
+class NoButtons : public Domain::AbstractButtons
+{
+public:
+    bool buttonsLocked() override { return false; }
+    void setButtonLock(bool) override {}
+};
+
+/// What the program's DSP object says, in its own thread and in order.
+struct Heard
+{
+    std::mutex mutex;
+    QStringList events;
+    QList<QVector<Domain::WirelessSensorReading>> frames;
+
+    void add(const QString& event)
+    {
+        const std::lock_guard lock(mutex);
+        events.append(event);
+    }
+    [[nodiscard]] QStringList all()
+    {
+        const std::lock_guard lock(mutex);
+        return events;
+    }
+    [[nodiscard]] qsizetype frameCount()
+    {
+        const std::lock_guard lock(mutex);
+        return frames.size();
+    }
+};
+
+} // namespace
+
+/// The program's side of the DSP link, through its library and a real socket, and the DSP of the virtual device,
+/// written apart from each other.
+class DspCrossCheckTest : public QObject
+{
+    Q_OBJECT
+
+    TestSupport::LogCapture log;
+    std::unique_ptr<Registry> registry;
+    std::unique_ptr<ModelThread<DspModel>> model;
+    NoButtons buttons;
+    std::unique_ptr<Domain::DspPort> port;
+    std::unique_ptr<Heard> heard;
+    std::unique_ptr<Domain::Dsp> dsp;
+
+    void set(const char* name, const QJsonValue& value) const
+    {
+        const auto wrong = registry->set(QString::fromLatin1(name), value);
+        QVERIFY2(!wrong, qPrintable(wrong.value_or(QString())));
+    }
+    [[nodiscard]] qint64 number(const char* name) const { return registry->integer(QString::fromLatin1(name)); }
+    [[nodiscard]] QString text(const char* name) const { return registry->text(QString::fromLatin1(name)); }
+    [[nodiscard]] bool flag(const char* name) const { return registry->flag(QString::fromLatin1(name)); }
+
+    void listen()
+    {
+        using Domain::Dsp;
+        const auto direct = Qt::DirectConnection;
+        Heard* to = heard.get();
+        connect(
+            dsp.get(), &Dsp::versionReceived, dsp.get(),
+            [to](Utilities::VersionNumber version) {
+                to->add(QStringLiteral("version ") + static_cast<QString>(version));
+            },
+            direct);
+        connect(
+            dsp.get(), &Dsp::lineNoiseDetected, dsp.get(), [to] { to->add(QStringLiteral("noise")); }, direct);
+        connect(
+            dsp.get(), &Dsp::startTriggerDetected, dsp.get(),
+            [to](quint16 frame, qint32 time) { to->add(QStringLiteral("start %1 %2").arg(frame).arg(time)); }, direct);
+        connect(
+            dsp.get(), &Dsp::stopTriggerDetected, dsp.get(),
+            [to](quint16 frame, qint32 time) { to->add(QStringLiteral("stop %1 %2").arg(frame).arg(time)); }, direct);
+        connect(
+            dsp.get(), &Dsp::pairingUpgradeDataReceived, dsp.get(),
+            [to](const Domain::PairingUpgradeData& packet) { to->add(static_cast<QString>(packet)); }, direct);
+        connect(
+            dsp.get(), &Dsp::sensorReadingsReceived, dsp.get(),
+            [to](const QVector<Domain::WirelessSensorReading>& readings) {
+                const std::lock_guard lock(to->mutex);
+                to->frames.append(readings);
+            },
+            direct);
+    }
+
+private slots:
+    void init()
+    {
+        QFile file(image);
+        QVERIFY(file.open(QIODevice::WriteOnly));
+        registry = std::make_unique<Registry>();
+        model = std::make_unique<ModelThread<DspModel>>(*registry);
+        std::optional<QString> problem;
+        model->call([&] { problem = (**model).open(QStringLiteral("/dev/dsplink")); });
+        QVERIFY2(!problem, qPrintable(problem.value_or(QString())));
+        log.clear();
+        port = std::make_unique<Domain::DspPort>(image);
+        heard = std::make_unique<Heard>();
+        dsp = std::make_unique<Domain::Dsp>(*port, buttons);
+        listen();
+        QCOMPARE(text("dsp.state"), QStringLiteral("connected"));
+    }
+
+    void cleanup()
+    {
+        dsp.reset();
+        QTRY_COMPARE(text("dsp.state"), QStringLiteral("off"));
+        port.reset();
+        QCOMPARE(number("dsp.violations"), 0);
+        model.reset();
+        registry.reset();
+        heard.reset();
+    }
+
+    void theFirmwareIsLoadedFromItsImage() { QCOMPARE(text("dsp.image"), image); }
+
+    void everyCommandArrivesAsItWasMeant()
+    {
+        QVERIFY(dsp->setReceiverEnableTest(2));
+        QCOMPARE(number("dsp.receiver"), 2);
+        QVERIFY(dsp->runHardwareTest(1));
+        QCOMPARE(number("dsp.hardware_test"), 1);
+        QVERIFY(dsp->setLongRangeAntennaEnable(true));
+        QVERIFY(flag("dsp.long_range_antenna"));
+        QVERIFY(dsp->setUpsamplingEnable(true));
+        QVERIFY(flag("dsp.upsampling"));
+        QVERIFY(dsp->configureLineNoiseDetection(Domain::LineNoiseDetectConfig(-5)));
+        QCOMPARE(number("dsp.line_noise_detection"), -5);
+        QVERIFY(dsp->setTrigger(Domain::DataGatherTrigger(7)));
+        QCOMPARE(number("dsp.trigger"), 7);
+        QVERIFY(dsp->setDspEnable(true));
+        QVERIFY(flag("dsp.enabled"));
+    }
+
+    void acquisitionModesArriveAsTheyWereMeant()
+    {
+        QVERIFY(dsp->setChannels(2, 40, 74, 10));
+        QVERIFY(dsp->setBaseAddress(0x123456));
+        QVERIFY(dsp->setAcquisitionMode(Domain::Dsp::PairingUpgradeModeA));
+        QVERIFY(flag("dsp.pairing_mode"));
+        QCOMPARE(number("dsp.pairing_parameter"), 12);
+        QVERIFY(!flag("dsp.gathering"));
+        QVERIFY(dsp->setAcquisitionMode(Domain::Dsp::DataGatheringMode));
+        QVERIFY(!flag("dsp.pairing_mode"));
+        QCOMPARE(number("dsp.pairing_parameter"), 8);
+        QVERIFY(flag("dsp.gathering"));
+        QCOMPARE(text("dsp.channels"), QStringLiteral("2 40 74 10"));
+        QCOMPARE(number("dsp.base_address"), 0x123456);
+    }
+
+    void whatTheDspSaysArrivesAsItWasMeant()
+    {
+        set("dsp.version", "2.10");
+        QVERIFY(dsp->requestVersion());
+        QTRY_COMPARE(heard->all().size(), 1);
+        set("dsp.start_trigger", "258 -2");
+        set("dsp.stop_trigger", "65535 1000");
+        set("dsp.message", "11001");
+        set("dsp.line_noise", "quiet");
+        set("dsp.line_noise", "detected");
+        set("dsp.pairing_packet", "123456abcdef05c0ffee");
+        const QStringList expected{"version 2.10", "start 258 -2", "stop 65535 1000", "noise",
+                                   "Source Address: 0x123456, Destination Address: 0xabcdef, Command: 5, Data: c0ffee"};
+        QTRY_COMPARE(heard->all(), expected);
+        set("dsp.log", "100%n of it");
+        QVERIFY(log.waitFor(QStringLiteral("DSP Log: 100%n of it")));
+    }
+
+    void sensorFramesAreDecodedToWhatTheSensorsSent()
+    {
+        set("dsp.sensors", 15);
+        set("dsp.sensor_types", "mixed");
+        set("dsp.sensor_rate", 100);
+        QVERIFY(dsp->setReceiverEnableTest(1));
+        QTRY_VERIFY(heard->frameCount() >= 20);
+        QVERIFY(dsp->setReceiverEnableTest(0));
+        for (quint16 frame = 0; frame < 20; ++frame) {
+            const auto& readings = heard->frames[frame];
+            QCOMPARE(readings.size(), 16);
+            for (int slot = 0; slot < 15; ++slot) {
+                const auto& reading = readings[slot];
+                QVERIFY(reading.isValid());
+                QCOMPARE(reading.frameNumber(), frame);
+                QCOMPARE(int(reading.sensorType()), slot % 2 == 0 ? 0 : 31);
+                QCOMPARE(int(reading.batteryLevel()), 100 + slot);
+                QCOMPARE(int(reading.signalStrength()), 200 - slot);
+                QCOMPARE(reading.pin1IsSet(), (slot & 1) != 0);
+                QCOMPARE(reading.pin2IsSet(), (slot & 2) != 0);
+                QCOMPARE(reading.channelData().size(), slot % 2 == 0 ? 4 : 3);
+                QCOMPARE(quint8(reading.channelData()[0][2]), SensorFrame::sample(frame, slot, 2));
+                QCOMPARE(quint8(reading.channelData()[1][0]), SensorFrame::sample(frame, slot, slot % 2 == 0 ? 54 : 3));
+            }
+            QVERIFY(!readings[15].isValid());
+        }
+    }
+
+    void refusedShortAndMissingAnswersFailTheCommand()
+    {
+        set("dsp.ack", "nak");
+        QVERIFY(!dsp->runHardwareTest(1));
+        QVERIFY(log.waitFor(QStringLiteral("Received Nak for DSP command 0x10009")));
+        for (const char* manner : {"short", "wrong-id", "off"}) {
+            log.clear();
+            set("dsp.ack", manner);
+            QVERIFY(!dsp->runHardwareTest(1));
+            QVERIFY(log.waitFor(QStringLiteral("Timed out waiting for DSP ACK")));
+        }
+        set("dsp.ack", "late");
+        set("dsp.ack_delay", 300);
+        QVERIFY(dsp->runHardwareTest(1));
+    }
+
+    void anAnswerOvertakesTheSensorsData()
+    {
+        set("dsp.sensor_rate", 500);
+        QVERIFY(dsp->setReceiverEnableTest(1));
+        for (int count = 0; count < 50; ++count)
+            QVERIFY(dsp->runHardwareTest(count));
+        QVERIFY(dsp->setReceiverEnableTest(0));
+        QCOMPARE(number("dsp.messages_lost"), 0);
+    }
+
+    void aDspThatGoesAwayFailsCommandsAndNothingElse()
+    {
+        set("dsp.presence", "missing");
+        QElapsedTimer clock;
+        clock.start();
+        QVERIFY(!dsp->runHardwareTest(1));
+        QVERIFY2(clock.elapsed() < 5000, qPrintable(QString::number(clock.elapsed())));
+    }
+};
+
+QTEST_GUILESS_MAIN(DspCrossCheckTest)
+#include "DspCrossCheckTest.moc"
