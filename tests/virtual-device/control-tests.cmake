@@ -13,6 +13,8 @@ immunityrig_test(ScreenTest
   SOURCES virtual-device/ScreenTest.cpp virtual-device/SampleProgram.cpp virtual-device/SampleProgram.h
   LIBRARIES VirtualDevice LABELS unit)
 add_dependencies(ScreenTest WindowSample)
+immunityrig_test(ScreenDisturbanceTest
+  SOURCES virtual-device/ScreenDisturbanceTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(RegistryTest SOURCES virtual-device/RegistryTest.cpp LIBRARIES VirtualDevice LABELS unit)
 foreach(test ControlServerTest ControlWaitTest)
   immunityrig_test(${test}

@@ -20,6 +20,8 @@ namespace
 
 constexpr int retryMilliseconds = 50;
 constexpr unsigned int connectSeconds = 5;
+/// The device's screen is 240 by 320; what announces much more is no screen.
+constexpr int largestSide = 4096;
 
 // Its address is the key under which the library keeps our pointer.
 int ownerTag = 0;
@@ -179,6 +181,8 @@ void RfbConnection::sendKey(quint32 symbol, bool pressed)
 
 signed char RfbConnection::allocateFrame(rfbClient* client)
 {
+    if (client->width > largestSide || client->height > largestSide)
+        return FALSE;
     auto& frame = ownerOf(client)->frame;
     frame = QImage(client->width, client->height, QImage::Format_RGB32);
     frame.fill(Qt::black);
