@@ -200,18 +200,10 @@ void SerialProtocolTest::sentMessagesAreFramed()
 void SerialProtocolTest::theLengthFieldOfAHugeMessageIsCutTo16Bits()
 {
     Link link;
-    QByteArray received;
-    std::atomic<bool> done = false;
     constexpr qsizetype size = 65536 + 3;
-    std::thread peer([&] {
-        while (!done)
-            received += link.pty.read();
-    });
     QVERIFY(link.protocol.sendMessage(QByteArray(size, '\x01')));
-    done = true;
-    peer.join();
-    // The driver may take only the beginning; what it says is what counts.
-    QCOMPARE(received.left(7).toHex(), QByteArray::fromHex("7C 0003 0003 0082").toHex());
+    // The driver may take only the beginning, which is enough.
+    QCOMPARE(link.pty.read(7).left(7).toHex(), QByteArray::fromHex("7C 0003 0003 0082").toHex());
 }
 
 void SerialProtocolTest::aFailedSendIsReported()
