@@ -541,7 +541,7 @@ void BeaconProcessorTest::aFailedSendLeavesTheCommandPendingWithoutATimer()
     auto lost = std::make_unique<Pty>();
     SerialPort port(lost->name(), SerialPort::Baud115200);
     BeaconProcessor processor(port);
-    std::atomic<int> errors = 0;
+    int errors = 0;
     connect(
         &processor, &BeaconProcessor::error, this, [&] { ++errors; }, Qt::DirectConnection);
     lost.reset();
@@ -552,7 +552,7 @@ void BeaconProcessorTest::aFailedSendLeavesTheCommandPendingWithoutATimer()
     // A timer would have run out by then.
     QTest::qWait(3500);
     QVERIFY(processor.isCommandPending());
-    QCOMPARE(errors.load(), 0);
+    QCOMPARE(errors, 0);
     QCOMPARE(log->count(", Beacon processor timed out"), 0);
 }
 
@@ -585,7 +585,7 @@ void BeaconProcessorTest::anAcknowledgementHandledBeforeTheWriteReturnsLeavesNoT
     BeaconProcessor processor(port);
     RadioPeer peer(pty);
     peer.answerWith(RadioPeer::wellBehaved);
-    std::atomic<int> errors = 0;
+    int errors = 0;
     connect(
         &processor, &BeaconProcessor::error, this, [&] { ++errors; }, Qt::DirectConnection);
     port.lingerUntil = [&] { return !processor.isCommandPending(); };
@@ -593,7 +593,7 @@ void BeaconProcessorTest::anAcknowledgementHandledBeforeTheWriteReturnsLeavesNoT
     QVERIFY(!processor.isCommandPending());
     // A timer that was left behind would have run out by then.
     QTest::qWait(3500);
-    QCOMPARE(errors.load(), 0);
+    QCOMPARE(errors, 0);
     QCOMPARE(log->texts(), QStringList());
 }
 
@@ -704,9 +704,8 @@ void BeaconProcessorTest::aNewProcessorGoesOnWithAnOpenPort()
     QVERIFY(log->waitFor(", Unable to open beacon serial port"));
     RadioPeer peer(pty);
     peer.answerWith(RadioPeer::wellBehaved);
-    std::atomic<bool> answered = false;
-    connect(
-        &processor, &BeaconProcessor::pingResponse, this, [&] { answered = true; }, Qt::DirectConnection);
+    bool answered = false;
+    connect(&processor, &BeaconProcessor::pingResponse, this, [&] { answered = true; });
     QVERIFY(processor.sendPing());
     QTRY_VERIFY(answered);
 }

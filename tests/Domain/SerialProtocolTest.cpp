@@ -9,11 +9,13 @@
 #include "tests/support/LogCapture.h"
 
 #include <QDir>
+#include <QEventLoop>
 #include <QFile>
 #include <QSignalSpy>
 #include <QTest>
-#include <QThread>
 
+#include <atomic>
+#include <future>
 #include <thread>
 
 using Domain::SerialPort;
@@ -352,29 +354,23 @@ void SerialProtocolTest::livesOnAnotherThreadThanThePort()
 {
     const Pty pty;
     SerialPort port(pty.name(), SerialPort::Baud115200);
-    QThread worker;
-    QObject inhabitant;
-    inhabitant.moveToThread(&worker);
-    worker.start();
-    std::unique_ptr<SerialProtocol> protocol;
-    std::atomic<QThread*> deliveredOn = nullptr;
-    QMetaObject::invokeMethod(
-        &inhabitant,
-        [&] {
-            protocol = std::make_unique<SerialProtocol>(port);
-            connect(
-                protocol.get(), &SerialProtocol::messageReceived, protocol.get(),
-                [&] { deliveredOn = QThread::currentThread(); }, Qt::DirectConnection);
-        },
-        Qt::BlockingQueuedConnection);
-    QVERIFY(protocol->sendMessage("from the caller's thread"));
+    std::promise<SerialProtocol*> made;
+    std::atomic<bool> deliveredThere = false;
+    std::thread worker([&] {
+        QEventLoop loop;
+        SerialProtocol protocol(port);
+        connect(&protocol, &SerialProtocol::messageReceived, &protocol, [&, here = std::this_thread::get_id()] {
+            deliveredThere = std::this_thread::get_id() == here;
+            loop.quit();
+        });
+        made.set_value(&protocol);
+        loop.exec();
+    });
+    QVERIFY(made.get_future().get()->sendMessage("from the caller's thread"));
     QCOMPARE(TestSupport::payloadOf(pty.read(32)), QByteArray("from the caller's thread"));
     pty.write(frameOf("x"));
-    QTRY_COMPARE(deliveredOn.load(), &worker);
-    QMetaObject::invokeMethod(
-        &inhabitant, [&] { protocol.reset(); }, Qt::BlockingQueuedConnection);
-    worker.quit();
-    QVERIFY(worker.wait());
+    worker.join();
+    QVERIFY(deliveredThere);
 }
 
 void SerialProtocolTest::aMessageHandlerMayParseAgain()

@@ -8,13 +8,13 @@
 #include "utilities/Debug.h"
 
 #include <QQueue>
-#include <QSemaphore>
 #include <QThread>
 #include <QTimer>
 #include <QtEndian>
 
 #include <algorithm>
 #include <array>
+#include <future>
 #include <mutex>
 
 namespace Domain
@@ -129,7 +129,8 @@ public:
     SerialPort& serialPort;
     std::unique_ptr<SerialProtocol> protocol; ///< made and destroyed on the worker thread, as is the timer
     std::unique_ptr<QTimer> ackTimer;
-    QSemaphore objectsCreated;
+    std::promise<void> objectsCreated;
+    std::promise<void> objectsDestroyed;
     std::mutex lock; ///< guards the queue and the flag; never held across a write
     QQueue<QByteArray> queue;
     bool commandPending = false;
@@ -214,12 +215,12 @@ bool BeaconProcessor::PrivateData::transmit(const QByteArray& message)
 
 void BeaconProcessor::PrivateData::startAckTimer()
 {
-    QMetaObject::invokeMethod(ackTimer.get(), [timer = ackTimer.get()] { timer->start(ackTimeoutMs); });
+    QMetaObject::invokeMethod(ackTimer.get(), "start", Q_ARG(int, ackTimeoutMs));
 }
 
 void BeaconProcessor::PrivateData::stopAckTimer()
 {
-    QMetaObject::invokeMethod(ackTimer.get(), &QTimer::stop);
+    QMetaObject::invokeMethod(ackTimer.get(), "stop");
 }
 
 void BeaconProcessor::PrivateData::handleAck(const QByteArray& /*reply*/)
@@ -290,18 +291,14 @@ BeaconProcessor::BeaconProcessor(SerialPort& serialPort) : data(std::make_unique
     connect(this, SIGNAL(threadStarted()), this, SLOT(createObjectsOnThread()));
     emit threadStarted();
     // A command may follow at once, and needs the objects.
-    data->objectsCreated.acquire();
+    data->objectsCreated.get_future().wait();
 }
 
+/// A timer can be stopped on its own thread only, and nothing may be destroyed while that thread still uses it.
 BeaconProcessor::~BeaconProcessor()
 {
-    QMetaObject::invokeMethod(
-        this,
-        [this] {
-            data->protocol.reset();
-            data->ackTimer.reset();
-        },
-        Qt::BlockingQueuedConnection);
+    QMetaObject::invokeMethod(this, "destroyObjectsOnThread", Qt::QueuedConnection);
+    data->objectsDestroyed.get_future().wait();
     data->workerThread.quit();
     data->workerThread.wait();
 }
@@ -424,8 +421,15 @@ void BeaconProcessor::createObjectsOnThread()
         data->ackTimer->setSingleShot(true);
         data->ackTimer->setTimerType(Qt::PreciseTimer);
         connect(data->ackTimer.get(), SIGNAL(timeout()), this, SLOT(timeout()));
-        data->objectsCreated.release();
+        data->objectsCreated.set_value();
     }
+}
+
+void BeaconProcessor::destroyObjectsOnThread()
+{
+    data->protocol.reset();
+    data->ackTimer.reset();
+    data->objectsDestroyed.set_value();
 }
 
 void BeaconProcessor::processMessage(QByteArray message)

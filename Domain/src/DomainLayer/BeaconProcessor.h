@@ -92,6 +92,9 @@ signals:
     void accelReadingCreateStart();
     void accelReadingCreateStop();
 
+private slots:
+    void destroyObjectsOnThread();
+
 private:
     class PrivateData;
 

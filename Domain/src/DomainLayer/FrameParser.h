@@ -42,8 +42,8 @@ constexpr qsizetype longestPayload = 100;
 ///
 /// After every refusal the search goes on one byte behind the refused start byte, so no damage hides an intact frame
 /// behind it. A partial frame waits for its rest without limit of time.
-/// Cost: linear in the bytes appended, however they are divided. Memory: the bytes of the last `append` and less than
-/// one frame of those before.
+/// Cost: linear in the bytes appended, however they are divided. Memory: 64 KiB, or for as long as it takes to parse
+/// it, a longer `append`.
 class FrameParser
 {
 public:
@@ -57,7 +57,7 @@ public:
         MissingEndOfPacket
     };
 
-    void append(QByteArray bytes);
+    void append(QByteArrayView bytes);
 
     /// Goes on to the next frame or refusal. `payload` holds the frame's payload until the next `append` or `advance`.
     [[nodiscard]] Outcome advance();
@@ -71,17 +71,19 @@ private:
         ReadingPayload
     };
 
-    [[nodiscard]] qsizetype available() const { return buffer.size() - position; }
-    [[nodiscard]] QByteArrayView at(qsizetype offset, qsizetype size) const;
+    [[nodiscard]] qsizetype available() const { return end - position; }
+    [[nodiscard]] const char* unparsed() const { return buffer.constData() + position; }
     [[nodiscard]] quint16 fieldAt(qsizetype offset) const;
+    void makeRoom(qsizetype size);
 
     [[nodiscard]] Outcome seekStartByte();
     [[nodiscard]] Outcome readHeader();
     [[nodiscard]] Outcome readPayload();
     [[nodiscard]] Outcome refuse(Outcome reason);
 
-    QByteArray buffer;
-    qsizetype position = 0; ///< of the first byte not yet parsed
+    QByteArray buffer; ///< storage; `position` to `end` are filled and not yet parsed
+    qsizetype position = 0;
+    qsizetype end = 0;
     State state = State::SeekingStartByte;
     quint16 payloadLength = 0;
     quint16 dataChecksum = 0;
