@@ -543,6 +543,15 @@ private slots:
         QTRY_COMPARE(tty->messages(), (Messages{"fe", "710105"}));
     }
 
+    void whatDoesNotFitOnTheLineIsLostAndCounted()
+    {
+        LineDirection direction(*registry, QStringLiteral("radio.to_radio"), 0);
+        direction.send(QByteArray(LineDirection::capacity, 'x'));
+        QCOMPARE(number("radio.bytes_lost"), 0);
+        direction.send("too much");
+        QCOMPARE(number("radio.bytes_lost"), 8);
+    }
+
     void mergedDeliveriesComeTogether()
     {
         set("radio.to_program.delivery", "merge");

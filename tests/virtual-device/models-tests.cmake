@@ -3,6 +3,7 @@
 immunityrig_test(RadioFrameTest SOURCES virtual-device/RadioFrameTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(LineDamageTest SOURCES virtual-device/LineDamageTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(RadioModelTest SOURCES virtual-device/RadioModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(RateTimerTest SOURCES virtual-device/RateTimerTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(DspCodecTest SOURCES virtual-device/DspCodecTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(DspModelTest SOURCES virtual-device/DspModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(SoundMatcherTest SOURCES virtual-device/SoundMatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)
