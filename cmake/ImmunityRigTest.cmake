@@ -24,5 +24,5 @@ function(immunityrig_test NAME)
   set_tests_properties(${NAME} PROPERTIES
     TIMEOUT ${TEST_TIMEOUT}
     LABELS "${TEST_LABELS}"
-    ENVIRONMENT "QT_QPA_PLATFORM=offscreen;LC_ALL=C.UTF-8;TZ=UTC;IMMUNITYRIG_BUILD=${CMAKE_BINARY_DIR};TSAN_OPTIONS=suppressions=${PROJECT_SOURCE_DIR}/tests/tsan.supp:halt_on_error=1:ignore_noninstrumented_modules=1;ASAN_OPTIONS=detect_stack_use_after_return=1;LSAN_OPTIONS=suppressions=${PROJECT_SOURCE_DIR}/tests/lsan.supp:print_suppressions=0;UBSAN_OPTIONS=print_stacktrace=1")
+    ENVIRONMENT "QT_QPA_PLATFORM=offscreen;LC_ALL=C.UTF-8;TZ=UTC;IMMUNITYRIG_BUILD=${CMAKE_BINARY_DIR};TSAN_OPTIONS=suppressions=${PROJECT_SOURCE_DIR}/tests/tsan.supp:halt_on_error=1:ignore_noninstrumented_modules=1:die_after_fork=0;ASAN_OPTIONS=detect_stack_use_after_return=1;LSAN_OPTIONS=suppressions=${PROJECT_SOURCE_DIR}/tests/lsan.supp:print_suppressions=0;UBSAN_OPTIONS=print_stacktrace=1")
 endfunction()
