@@ -3,9 +3,11 @@
 immunityrig_test(RadioFrameTest SOURCES virtual-device/RadioFrameTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(LineDamageTest SOURCES virtual-device/LineDamageTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(RadioModelTest SOURCES virtual-device/RadioModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(RadioLineTest SOURCES virtual-device/RadioLineTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(RateTimerTest SOURCES virtual-device/RateTimerTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(DspCodecTest SOURCES virtual-device/DspCodecTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(DspModelTest SOURCES virtual-device/DspModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(DspEventsTest SOURCES virtual-device/DspEventsTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(SoundMatcherTest SOURCES virtual-device/SoundMatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(AudioWatcherTest SOURCES virtual-device/AudioWatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)
 
