@@ -10,12 +10,13 @@
 #include <QCoreApplication>
 #include <QElapsedTimer>
 #include <QFile>
-#include <QProcess>
 #include <QTest>
 
 #include <fcntl.h>
 #include <pthread.h>
+#include <spawn.h>
 #include <sys/resource.h>
+#include <sys/wait.h>
 #include <termios.h>
 #include <unistd.h>
 
@@ -603,12 +604,19 @@ void SerialPortTest::aFileInPlaceOfALineCostsNoProcessor()
 void SerialPortTest::theLineNeverBecomesTheControllingTerminal()
 {
     const Pty pty;
-    QProcess child;
-    child.setChildProcessModifier([] { ::setsid(); });
-    child.start(QCoreApplication::applicationFilePath(), {sessionLeaderArgument, pty.name()});
-    QVERIFY(child.waitForFinished());
-    QCOMPARE(child.exitStatus(), QProcess::NormalExit);
-    QCOMPARE(child.exitCode(), 0);
+    QByteArray program = QCoreApplication::applicationFilePath().toLocal8Bit();
+    QByteArray argument = sessionLeaderArgument;
+    QByteArray line = pty.name().toLocal8Bit();
+    char* arguments[] = {program.data(), argument.data(), line.data(), nullptr};
+    posix_spawnattr_t attributes;
+    ::posix_spawnattr_init(&attributes);
+    ::posix_spawnattr_setflags(&attributes, POSIX_SPAWN_SETSID);
+    pid_t child = 0;
+    QCOMPARE(::posix_spawn(&child, program.constData(), nullptr, &attributes, arguments, environ), 0);
+    int status = 0;
+    QCOMPARE(::waitpid(child, &status, 0), child);
+    QVERIFY(WIFEXITED(status));
+    QCOMPARE(WEXITSTATUS(status), 0);
 }
 
 void SerialPortTest::anUnreadLineWaitsInTheDriverAndLosesNothing()
