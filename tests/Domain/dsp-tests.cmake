@@ -9,3 +9,7 @@ immunityrig_test(DspPortTest SOURCES Domain/DspPortTest.cpp Domain/DspTestParts.
 immunityrig_test(DspTest SOURCES Domain/DspTest.cpp LIBRARIES Domain LABELS integration)
 immunityrig_test(DspReceiveTest SOURCES Domain/DspReceiveTest.cpp LIBRARIES Domain LABELS integration)
 immunityrig_test(DspRecordsTest SOURCES Domain/DspRecordsTest.cpp LIBRARIES Domain LABELS unit)
+
+add_test(NAME FindDspLinkTest COMMAND ${CMAKE_COMMAND} -DWORK=${CMAKE_CURRENT_BINARY_DIR}/find-dsplink
+  -P ${CMAKE_CURRENT_SOURCE_DIR}/dsplink/find-module-test.cmake)
+set_tests_properties(FindDspLinkTest PROPERTIES LABELS unit)
