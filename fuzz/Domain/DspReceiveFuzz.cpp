@@ -6,6 +6,7 @@
 #include "Domain/src/DomainLayer/DspPort.h"
 #include "tests/support/InstantDsp.h"
 
+#include <QCoreApplication>
 #include <QSemaphore>
 
 #include <algorithm>
@@ -71,6 +72,10 @@ private:
 // Any messages through the port: two bytes of length and one that chooses the message id before each.
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* bytes, std::size_t size)
 {
+    static int argumentCount = 1;
+    static char name[] = "DspReceiveFuzz";
+    static char* arguments[] = {name, nullptr};
+    static const QCoreApplication application(argumentCount, arguments); // threads have no event loop without
     static Receiver receiver;
     constexpr std::size_t prefix = 3;
     constexpr std::size_t longest = 2028;

@@ -4,6 +4,7 @@
 #include "Domain/src/DomainLayer/WirelessSensorReading.h"
 
 #include <QDataStream>
+#include <QIODevice>
 
 #include <cstdint>
 #include <cstdlib>
