@@ -391,20 +391,22 @@ private slots:
 
     void endingWhileDataArriveIsClean()
     {
-        std::atomic<bool> sending = true;
-        auto sender = std::async(std::launch::async, [&] {
-            while (sending) {
-                if (!peer->sendDsp(0x11004, QByteArray(2020, '\1')))
-                    QThread::msleep(1);
-            }
-        });
-        const auto end = qScopeGuard([&] { sending = false; });
         for (int round = 0; round < 4; ++round) {
             std::atomic<int> handled = 0;
             connect(
                 dsp.get(), &Dsp::sensorDataReceived, this, [&] { ++handled; }, Qt::DirectConnection);
+            std::atomic<bool> sending = true;
+            auto sender = std::async(std::launch::async, [&] {
+                while (sending) {
+                    if (!peer->sendDsp(0x11004, QByteArray(2020, '\1')))
+                        QThread::msleep(1);
+                }
+            });
+            const auto end = qScopeGuard([&] { sending = false; });
             QTRY_VERIFY(handled > 10);
             dsp.reset();
+            sending = false;
+            sender.get();
             dsp = std::make_unique<Dsp>(*port, *buttons);
         }
     }
