@@ -50,7 +50,7 @@ bool isPainted(const rfbClient& client, int x, int y)
 
 bool isComplete(const rfbClient& client)
 {
-    return client.width == 240 && client.height == 320 && isPainted(client, 5, 5) && isPainted(client, 120, 200) &&
+    return client.width == 240 && client.height == 320 && isPainted(client, 5, 5) && isPainted(client, 20, 205) &&
            isPainted(client, 235, 314);
 }
 
