@@ -196,7 +196,7 @@ private slots:
         QCOMPARE(port->write("x", 1), -1);
         QCOMPARE(sourcedTexts(*log), QStringList{"DspPort: MSGQ_alloc() failed. Status = 0x80008008"});
         // Nothing that was fatal before the event loop runs ends it.
-        QTimer::singleShot(50, qApp, [] { QCoreApplication::exit(7); });
+        QTimer::singleShot(50, QCoreApplication::instance(), [] { QCoreApplication::exit(7); });
         QCOMPARE(QCoreApplication::exec(), 7);
     }
 
