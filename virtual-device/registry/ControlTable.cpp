@@ -57,8 +57,8 @@ constexpr std::array controls{
     choiceControl("sd.fault", fileFaults, "none", "how everything on the data partition fails"),
 
     // Signal lines
-    integerControl("trigger.period", "ms", 0, hour, "0", "a trigger (F10) arrives this often; 0 = never"),
-    integerControl("radioline.period", "ms", 0, hour, "0", "the radio line (F11) is raised this often; 0 = never"),
+    integerControl("trigger.period", "ms", 0, hour, "500", "a trigger (F10) arrives this often; 0 = never"),
+    integerControl("radioline.period", "ms", 0, hour, "1000", "the radio line (F11) is raised this often; 0 = never"),
     reported(integerControl("led.power_latch", "", 0, 255, "0", "the power latch; the program never clears it")),
     reported(integerControl("led.writes", "", 0, plenty, "0", "how often the power latch was written")),
     reported(textControl("led.written", 64, "", "when the power latch was last written")),
