@@ -3,24 +3,21 @@
 # SPDX-License-Identifier: MIT
 #
 # shot.sh BUILD FILE.png
-# Runs the program on a virtual device of its own until every region is green, and pictures its window.
+# Runs the program on a virtual device of its own until everything that can be green is, and pictures its window.
 set -eu
-device="$1/virtual-device/virtual-device" picture=$2 name=shot-$$
+device="$1/virtual-device/virtual-device" picture=$2
+name=shot-$$ output=$(mktemp)
 
-"$device" run --name "$name" >/dev/null &
+"$device" run --name "$name" >"$output" 2>&1 &
 runner=$!
-trap 'kill "$runner" 2>/dev/null || true; wait "$runner" 2>/dev/null || true' EXIT
+trap 'kill "$runner" 2>/dev/null || true; wait "$runner" || true; rm -f "$output"' EXIT
 
-ctl() { "$device" ctl --device "$name" "$@"; }
-tries=0
-until ctl get battery.voltage >/dev/null 2>&1; do
-  kill -0 "$runner" 2>/dev/null || { echo "shot: the virtual device did not start" >&2; exit 1; }
-  tries=$((tries + 1))
-  [ "$tries" -lt 120 ] || { echo "shot: the virtual device does not answer" >&2; exit 1; }
-  sleep 0.5
+until grep -q '^ready' "$output"; do
+  kill -0 "$runner" 2>/dev/null || { cat "$output" >&2; exit 1; }
+  sleep 0.2
 done
-for region in $(ctl regions --json | tr ',{}' '\n' | sed -n 's/.*"name" *: *"\([^"]*\)".*/\1/p'); do
-  :
+for region in usb-device usb-gadget trigger sd-card rf.beacon rf.radios; do
+  "$device" ctl --device "$name" wait region "$region" green --within 30 ||
+    { echo "shot: $region does not turn green" >&2; exit 1; }
 done
-ctl screenshot "$picture"
-echo "shot: $picture"
+"$device" ctl --device "$name" screenshot "$picture"
