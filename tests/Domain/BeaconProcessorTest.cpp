@@ -3,38 +3,27 @@
 
 #include "Domain/src/DomainLayer/BeaconProcessor.h"
 
-#include "Domain/src/DomainLayer/SerialPort.h"
-#include "tests/Domain/Frames.h"
-#include "tests/Domain/Pty.h"
-#include "tests/Domain/RadioPeer.h"
+#include "tests/Domain/Radio.h"
 #include "tests/support/LogCapture.h"
 
-#include <QDir>
-#include <QFile>
 #include <QTest>
 
-#include <algorithm>
-#include <atomic>
+#include <array>
 #include <functional>
-#include <thread>
-#include <vector>
 
 using Domain::AbstractBeaconProcessor;
 using Domain::BeaconPacket;
 using Domain::BeaconProcessor;
-using Domain::SerialPort;
-using TestSupport::frameOf;
+using TestSupport::generousMs;
 using TestSupport::LogCapture;
 using TestSupport::Pty;
-using TestSupport::RadioPeer;
+using TestSupport::Radio;
 
 namespace
 {
 
 using Operation = std::function<bool(BeaconProcessor&)>;
 using Packets = QVector<BeaconPacket>;
-
-constexpr int generousMs = 20000;
 
 BeaconPacket packet(int type, int value)
 {
@@ -49,84 +38,6 @@ Packets packets(int count)
     return all;
 }
 
-/// A processor on a real line with a microcontroller, and what its signals told, in order.
-class Radio : public QObject
-{
-public:
-    Radio() : port(pty.name(), SerialPort::Baud115200), processor(port), peer(pty) { record(); }
-
-    [[nodiscard]] bool tells(const QStringList& expected) const
-    {
-        return QTest::qWaitFor([&] { return events == expected; }, generousMs);
-    }
-    [[nodiscard]] bool takes(const QList<QByteArray>& commands) const
-    {
-        return QTest::qWaitFor([&] { return peer.commands() == commands; }, generousMs);
-    }
-    [[nodiscard]] bool becomesIdle()
-    {
-        return QTest::qWaitFor([&] { return !processor.isCommandPending(); }, generousMs);
-    }
-    /// The microcontroller says something, asked or not, and its frame is handled.
-    void says(const QByteArray& message) const { pty.write(frameOf(message)); }
-    /// Everything said before has been handled when this returns true.
-    [[nodiscard]] bool settles()
-    {
-        const auto told = events.size();
-        says("\x03");
-        const bool settled =
-            QTest::qWaitFor([&] { return events.mid(told).contains("transmitPacketComplete"); }, generousMs);
-        events.removeOne("transmitPacketComplete");
-        return settled;
-    }
-
-    Pty pty;
-    SerialPort port;
-    BeaconProcessor processor;
-    RadioPeer peer;
-    QStringList events;
-
-private:
-    void record()
-    {
-        using Processor = BeaconProcessor;
-        connect(&processor, &Processor::error, this, [this](auto code) { events << QString("error %1").arg(code); });
-        connect(&processor, &Processor::pingResponse, this, [this] { events << "pingResponse"; });
-        connect(&processor, &Processor::transmitPacketComplete, this, [this] { events << "transmitPacketComplete"; });
-        connect(&processor, &Processor::firmwareVersionReceived, this,
-                [this](const QString& version) { events << "version " + version; });
-        connect(&processor, &Processor::checkRadioReplyReceived, this,
-                [this](auto result) { events << QString("radio %1").arg(int(result)); });
-        connect(&processor, &Processor::accelReadingCreateStart, this, [this] { events << "start"; });
-        connect(&processor, &Processor::accelReadingCreateStop, this, [this] { events << "stop"; });
-        connect(&processor, &Processor::accelReadingReceived, this, [this](const Domain::AccelReading& reading) {
-            events << QString("accel %1 %2 %3")
-                          .arg(reading.frameNumber())
-                          .arg(int(reading.mode()))
-                          .arg(QString(reading.channelData().toHex()));
-        });
-    }
-};
-
-/// A real port whose writes come back late, as they do when the writing thread loses the processor.
-class LingeringPort : public SerialPort
-{
-public:
-    using SerialPort::SerialPort;
-
-    std::function<bool()> lingerUntil = [] { return true; };
-
-protected:
-    qint64 writeData(const char* bytes, qint64 count) override
-    {
-        const auto written = SerialPort::writeData(bytes, count);
-        const QDeadlineTimer deadline(generousMs);
-        while (!lingerUntil() && !deadline.hasExpired())
-            std::this_thread::yield();
-        return written;
-    }
-};
-
 } // namespace
 
 Q_DECLARE_METATYPE(Operation)
@@ -139,6 +50,7 @@ private slots:
     void init();
     void cleanup() { log.reset(); }
 
+    void theErrorTypeIsKnownByNameOnceAProcessorStands();
     void everyCommandHasItsBytes_data();
     void everyCommandHasItsBytes();
     void argumentsAreCheckedBeforeSending_data();
@@ -155,23 +67,6 @@ private slots:
     void aRadioCheckAboveThreeIsOutOfRange();
     void textIsLoggedAsReceived_data();
     void textIsLoggedAsReceived();
-    void onlyOneCommandIsInFlight();
-    void sevenCommandsBackToBackAllArriveAndTwoWarn();
-    void aRefusedCommandIsFollowedByTheNext();
-    void aTimedOutCommandIsFollowedByTheNextAndNotRepeated();
-    void anAcknowledgementWithDataLeavesTheCommandToTimeOut();
-    void repliesForNobodyDoNoHarm();
-    void aFailedSendLeavesTheCommandPendingWithoutATimer();
-    void aFailedQueuedSendClearsThePendingFlag();
-    void aTimeoutWithNothingPendingIsSilent();
-    void anAcknowledgementHandledBeforeTheWriteReturnsLeavesNoTimerBehind();
-    void pendingEndsWithoutTheCallersEventLoop();
-    void commandsOfManyThreadsAllArriveInEachThreadsOrder();
-    void aCommandRightAfterConstructionIsSent();
-    void aConversationSurvivesNoise();
-    void aMissingLineDoesNotKeepTheProcessorFromStanding();
-    void mayBeDestroyedInTheMiddleOfEverything();
-    void aNewProcessorGoesOnWithAnOpenPort();
     void errorTravelsInAQueuedConnectionByName();
     void lastErrorIs(Domain::AbstractBeaconProcessor::Error error) { lastError = error; }
 
@@ -182,10 +77,17 @@ private:
 
 void BeaconProcessorTest::init()
 {
-    QDir().mkpath("/sys/class/misc/msp430");
-    QFile reset("/sys/class/misc/msp430/reset");
-    QVERIFY(reset.open(QIODevice::WriteOnly));
+    TestSupport::makeResetLine();
     log = std::make_unique<LogCapture>();
+}
+
+/// The first of all: whatever connects to the signal makes the type known, too.
+void BeaconProcessorTest::theErrorTypeIsKnownByNameOnceAProcessorStands()
+{
+    const Pty pty;
+    Domain::SerialPort port(pty.name(), Domain::SerialPort::Baud115200);
+    const BeaconProcessor processor(port);
+    QVERIFY(QMetaType::fromName("Domain::AbstractBeaconProcessor::Error").isValid());
 }
 
 void BeaconProcessorTest::everyCommandHasItsBytes_data()
@@ -403,7 +305,7 @@ void BeaconProcessorTest::aRadioCheckAboveThreeIsOutOfRange_data()
 {
     QTest::addColumn<int>("value");
     QTest::addColumn<QString>("shown");
-    QTest::addRow("just above") << 4 << "";
+    QTest::addRow("just above") << 4 << "\x04";
     QTest::addRow("letter") << int('A') << "A";
     QTest::addRow("percent sign") << int('%') << "%";
     QTest::addRow("Latin-1 letter") << 0xE9 << QStringLiteral("\u00e9");
@@ -416,9 +318,8 @@ void BeaconProcessorTest::aRadioCheckAboveThreeIsOutOfRange()
     Radio radio;
     radio.says(QByteArray("\x63") + static_cast<char>(value));
     QVERIFY(radio.tells({"error 5"}));
-    QVERIFY(QTest::qWaitFor([&] { return !log->texts().isEmpty(); }, generousMs));
-    const QString text = ", Received check radio response with out of range value ";
-    QVERIFY2(log->texts().front().contains(text + shown), qPrintable(log->texts().front()));
+    QVERIFY2(log->waitFor(", Received check radio response with out of range value " + shown),
+             qPrintable(log->texts().value(0)));
 }
 
 void BeaconProcessorTest::textIsLoggedAsReceived_data()
@@ -443,279 +344,11 @@ void BeaconProcessorTest::textIsLoggedAsReceived()
     QCOMPARE(radio.events, QStringList());
 }
 
-void BeaconProcessorTest::onlyOneCommandIsInFlight()
-{
-    Radio radio;
-    QVERIFY(radio.processor.sendPing());
-    QVERIFY(radio.processor.checkRadioInterface());
-    QVERIFY(radio.takes({"\x7E"}));
-    QVERIFY(radio.settles());
-    QCOMPARE(radio.peer.commands(), QList<QByteArray>{"\x7E"});
-    radio.says("\xFE");
-    QVERIFY(radio.takes({"\x7E", "\x62"}));
-    QVERIFY(radio.processor.isCommandPending());
-    radio.says("\xFE");
-    QVERIFY(radio.becomesIdle());
-    QCOMPARE(radio.events, QStringList());
-}
-
-void BeaconProcessorTest::sevenCommandsBackToBackAllArriveAndTwoWarn()
-{
-    Radio radio;
-    QList<QByteArray> expected;
-    for (int mode = 0; mode < 7; ++mode) {
-        QVERIFY(radio.processor.setAccelMode(static_cast<uchar>(mode)));
-        expected.append(QByteArray("\x30") + static_cast<char>(mode));
-    }
-    QVERIFY(radio.takes({expected.front()}));
-    // The sixth that waits is one too many: that is the seventh command.
-    QVERIFY(log->waitFor(", Beacon processor message queue over maximum"));
-    QVERIFY(radio.processor.setAccelMode(7));
-    expected.append("\x30\x07");
-    QVERIFY(log->waitFor(", Beacon processor message queue over maximum", 2));
-    QCOMPARE(log->lines().size(), std::size_t(2));
-    radio.peer.answerWith(RadioPeer::wellBehaved);
-    radio.says("\xFE");
-    QVERIFY(radio.takes(expected));
-    QVERIFY(radio.becomesIdle());
-}
-
-void BeaconProcessorTest::aRefusedCommandIsFollowedByTheNext()
-{
-    Radio radio;
-    QVERIFY(radio.processor.sendPing());
-    QVERIFY(radio.processor.checkRadioInterface());
-    QVERIFY(radio.takes({"\x7E"}));
-    radio.pty.write(RadioPeer::nak('\xC8'));
-    QVERIFY(radio.takes({"\x7E", "\x62"}));
-    QVERIFY(radio.tells({"error 0"}));
-    QVERIFY(log->waitFor(", Received application-level NAK with data = 200"));
-    QVERIFY(radio.processor.isCommandPending());
-}
-
-void BeaconProcessorTest::aTimedOutCommandIsFollowedByTheNextAndNotRepeated()
-{
-    Radio radio;
-    QVERIFY(radio.processor.sendPing());
-    QVERIFY(radio.processor.checkRadioInterface());
-    radio.peer.answerWith(
-        [](const QByteArray& command) { return command == "\x62" ? RadioPeer::ack() : QByteArray(); });
-    QVERIFY(radio.takes({"\x7E", "\x62"}));
-    QVERIFY(radio.tells({"error 1"}));
-    QVERIFY(log->waitFor(", Beacon processor timed out"));
-    QVERIFY(radio.becomesIdle());
-    QVERIFY(radio.settles());
-    QCOMPARE(radio.peer.commands().size(), 2);
-    QCOMPARE(log->lines().size(), std::size_t(1));
-}
-
-void BeaconProcessorTest::anAcknowledgementWithDataLeavesTheCommandToTimeOut()
-{
-    Radio radio;
-    QVERIFY(radio.processor.sendPing());
-    QVERIFY(radio.processor.checkRadioInterface());
-    radio.says(QByteArray("\xFE\x00", 2));
-    QVERIFY(radio.tells({"error 4"}));
-    QVERIFY(radio.settles());
-    QVERIFY(radio.processor.isCommandPending());
-    QCOMPARE(radio.peer.commands().size(), 1);
-    QVERIFY(radio.tells({"error 4", "error 1"}));
-    QVERIFY(radio.takes({"\x7E", "\x62"}));
-}
-
-void BeaconProcessorTest::repliesForNobodyDoNoHarm()
-{
-    Radio radio;
-    radio.pty.write(RadioPeer::ack() + RadioPeer::nak(1) + RadioPeer::ack());
-    QVERIFY(radio.tells({"error 0"}));
-    QVERIFY(radio.settles());
-    QVERIFY(!radio.processor.isCommandPending());
-    radio.peer.answerWith(RadioPeer::wellBehaved);
-    QVERIFY(radio.processor.sendPing());
-    QVERIFY(radio.tells({"error 0", "pingResponse"}));
-}
-
-void BeaconProcessorTest::aFailedSendLeavesTheCommandPendingWithoutATimer()
-{
-    const Pty pty;
-    auto lost = std::make_unique<Pty>();
-    SerialPort port(lost->name(), SerialPort::Baud115200);
-    BeaconProcessor processor(port);
-    int errors = 0;
-    connect(
-        &processor, &BeaconProcessor::error, this, [&] { ++errors; }, Qt::DirectConnection);
-    lost.reset();
-    QVERIFY(!processor.sendPing());
-    QVERIFY(log->waitFor(", Unable to send serial packet"));
-    QVERIFY(processor.isCommandPending());
-    QVERIFY(processor.sendPing());
-    // A timer would have run out by then.
-    QTest::qWait(3500);
-    QVERIFY(processor.isCommandPending());
-    QCOMPARE(errors, 0);
-    QCOMPARE(log->count(", Beacon processor timed out"), 0);
-}
-
-void BeaconProcessorTest::aFailedQueuedSendClearsThePendingFlag()
-{
-    auto lost = std::make_unique<Pty>();
-    SerialPort port(lost->name(), SerialPort::Baud115200);
-    BeaconProcessor processor(port);
-    QVERIFY(processor.sendPing());
-    QVERIFY(processor.checkRadioInterface());
-    lost.reset();
-    QMetaObject::invokeMethod(&processor, "processMessage", Qt::QueuedConnection, Q_ARG(QByteArray, "\xFE"));
-    QTRY_VERIFY(!processor.isCommandPending());
-    QVERIFY(log->waitFor(", Unable to send serial packet"));
-}
-
-void BeaconProcessorTest::aTimeoutWithNothingPendingIsSilent()
-{
-    Radio radio;
-    QMetaObject::invokeMethod(&radio.processor, "timeout", Qt::BlockingQueuedConnection);
-    QVERIFY(radio.settles());
-    QCOMPARE(radio.events, QStringList());
-    QCOMPARE(log->texts(), QStringList());
-}
-
-void BeaconProcessorTest::anAcknowledgementHandledBeforeTheWriteReturnsLeavesNoTimerBehind()
-{
-    Pty pty;
-    LingeringPort port(pty.name(), SerialPort::Baud115200);
-    BeaconProcessor processor(port);
-    RadioPeer peer(pty);
-    peer.answerWith(RadioPeer::wellBehaved);
-    int errors = 0;
-    connect(
-        &processor, &BeaconProcessor::error, this, [&] { ++errors; }, Qt::DirectConnection);
-    port.lingerUntil = [&] { return !processor.isCommandPending(); };
-    QVERIFY(processor.sendPing());
-    QVERIFY(!processor.isCommandPending());
-    // A timer that was left behind would have run out by then.
-    QTest::qWait(3500);
-    QCOMPARE(errors, 0);
-    QCOMPARE(log->texts(), QStringList());
-}
-
-void BeaconProcessorTest::pendingEndsWithoutTheCallersEventLoop()
-{
-    Radio radio;
-    radio.peer.answerWith(RadioPeer::wellBehaved);
-    for (int round = 0; round < 100; ++round) {
-        QVERIFY(radio.processor.setPowerAmpEnable(round % 2 == 0));
-        const QDeadlineTimer deadline(generousMs);
-        while (radio.processor.isCommandPending() && !deadline.hasExpired())
-            std::this_thread::yield();
-        QVERIFY(!deadline.hasExpired());
-    }
-}
-
-void BeaconProcessorTest::commandsOfManyThreadsAllArriveInEachThreadsOrder()
-{
-    constexpr int threadCount = 4;
-    constexpr int commandsEach = 100;
-    Radio radio;
-    radio.peer.answerWith(RadioPeer::wellBehaved);
-    std::atomic<int> refused = 0;
-    std::vector<std::thread> threads;
-    for (int thread = 0; thread < threadCount; ++thread)
-        threads.emplace_back([&, thread] {
-            for (int index = 0; index < commandsEach; ++index)
-                refused +=
-                    !radio.processor.transmitPacket(static_cast<unsigned>(thread), 2, static_cast<uchar>(index), "x");
-        });
-    for (auto& thread : threads)
-        thread.join();
-    QCOMPARE(refused.load(), 0);
-    QTRY_COMPARE_WITH_TIMEOUT(radio.peer.commands().size(), threadCount * commandsEach, generousMs);
-    std::array<int, threadCount> next{};
-    for (const auto& command : radio.peer.commands()) {
-        constexpr qsizetype addressOffset = 3;
-        constexpr qsizetype argumentOffset = 5;
-        const auto thread = static_cast<std::size_t>(command.at(addressOffset));
-        QCOMPARE(int(command.at(argumentOffset)), next.at(thread)++);
-    }
-    QVERIFY(radio.becomesIdle());
-    QCOMPARE(radio.events, QStringList());
-}
-
-void BeaconProcessorTest::aCommandRightAfterConstructionIsSent()
-{
-    const Pty pty;
-    for (int round = 0; round < 50; ++round) {
-        SerialPort port(pty.name(), SerialPort::Baud115200);
-        BeaconProcessor processor(port);
-        QVERIFY(processor.sendPing());
-        QCOMPARE(TestSupport::payloadOf(pty.read(9)), QByteArray("\x7E"));
-    }
-    QCOMPARE(log->texts(), QStringList());
-}
-
-void BeaconProcessorTest::aConversationSurvivesNoise()
-{
-    Radio radio;
-    radio.peer.answerWith([generator = TestSupport::Generator(41)](const QByteArray& command) mutable {
-        const auto noise = [&] {
-            return TestSupport::randomBytes(generator, TestSupport::randomBetween(generator, 0, 150));
-        };
-        // Behind the answer enough bytes for any false header in the noise to be seen through.
-        return noise() + RadioPeer::ack() + noise() + frameOf("\x7F") + QByteArray(200, command.front());
-    });
-    constexpr int rounds = 200;
-    for (int round = 0; round < rounds; ++round) {
-        QVERIFY(radio.processor.sendPing());
-        QVERIFY(radio.becomesIdle());
-    }
-    QVERIFY(radio.tells(QStringList(rounds, "pingResponse")));
-    QCOMPARE(radio.peer.commands().size(), rounds);
-}
-
-void BeaconProcessorTest::aMissingLineDoesNotKeepTheProcessorFromStanding()
-{
-    SerialPort port("/dev/ttyS1", SerialPort::Baud115200);
-    BeaconProcessor processor(port);
-    QVERIFY(log->waitFor(", Unable to open beacon serial port"));
-    QVERIFY(!processor.sendPing());
-    QVERIFY(processor.isCommandPending());
-}
-
-void BeaconProcessorTest::mayBeDestroyedInTheMiddleOfEverything()
-{
-    for (int round = 0; round < 20; ++round) {
-        Pty pty;
-        SerialPort port(pty.name(), SerialPort::Baud115200);
-        auto processor = std::make_unique<BeaconProcessor>(port);
-        RadioPeer peer(pty);
-        peer.answerWith(RadioPeer::wellBehaved);
-        for (int index = 0; index < 20; ++index) {
-            QVERIFY(processor->sendPing());
-            pty.write(frameOf("\x7F") + "|noise|" + frameOf("\x7B"));
-        }
-        processor.reset();
-    }
-}
-
-void BeaconProcessorTest::aNewProcessorGoesOnWithAnOpenPort()
-{
-    Pty pty;
-    SerialPort port(pty.name(), SerialPort::Baud115200);
-    std::make_unique<BeaconProcessor>(port).reset();
-    BeaconProcessor processor(port);
-    QVERIFY(log->waitFor(", Unable to open beacon serial port"));
-    RadioPeer peer(pty);
-    peer.answerWith(RadioPeer::wellBehaved);
-    bool answered = false;
-    connect(&processor, &BeaconProcessor::pingResponse, this, [&] { answered = true; });
-    QVERIFY(processor.sendPing());
-    QTRY_VERIFY(answered);
-}
-
 void BeaconProcessorTest::errorTravelsInAQueuedConnectionByName()
 {
     Radio radio;
     QVERIFY(connect(&radio.processor, SIGNAL(error(Domain::AbstractBeaconProcessor::Error)), this,
                     SLOT(lastErrorIs(Domain::AbstractBeaconProcessor::Error)), Qt::QueuedConnection));
-    QVERIFY(QMetaType::fromName("Domain::AbstractBeaconProcessor::Error").isValid());
     radio.says(QByteArray("\x63\x04", 2));
     QTRY_COMPARE(lastError, AbstractBeaconProcessor::OutOfRangeValue);
 }

@@ -7,3 +7,5 @@ immunityrig_test(SerialProtocolTest SOURCES Domain/SerialProtocolTest.cpp Domain
   LIBRARIES Domain LABELS unit)
 immunityrig_test(BeaconProcessorTest SOURCES Domain/BeaconProcessorTest.cpp Domain/Frames.cpp Domain/Pty.cpp
   Domain/RadioPeer.cpp LIBRARIES Domain LABELS unit)
+immunityrig_test(BeaconEngineTest SOURCES Domain/BeaconEngineTest.cpp Domain/Frames.cpp Domain/Pty.cpp
+  Domain/RadioPeer.cpp LIBRARIES Domain LABELS unit)

@@ -14,6 +14,7 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <future>
 #include <mutex>
 
@@ -113,8 +114,9 @@ public:
     [[nodiscard]] bool send(Command command, const QByteArray& payload = {});
     void sendNext();
     [[nodiscard]] bool transmit(const QByteArray& message);
-    void startAckTimer();
+    [[nodiscard]] unsigned startAckTimer();
     void stopAckTimer();
+    void stopAckTimerOf(unsigned attempt);
 
     void handleAck(const QByteArray& reply);
     void handleNak(const QByteArray& reply);
@@ -134,6 +136,7 @@ public:
     std::mutex lock; ///< guards the queue and the flag; never held across a write
     QQueue<QByteArray> queue;
     bool commandPending = false;
+    std::atomic<unsigned> attempts = 0; ///< to write a command to the line
     QThread workerThread;
 };
 
@@ -166,7 +169,8 @@ void BeaconProcessor::PrivateData::handle(const Reply& reply, const QByteArray& 
     emit owner.error(IncorrectLength);
 }
 
-/// Only the caller that finds no command pending writes; so no two writes ever meet.
+/// Only the caller that finds no command pending writes. (Two writes meet only when the microcontroller acknowledges
+/// what it has not got yet; the driver keeps each of them whole.)
 bool BeaconProcessor::PrivateData::send(Command command, const QByteArray& payload)
 {
     const QByteArray message = bytesOf({static_cast<unsigned char>(command)}) + payload;
@@ -206,21 +210,33 @@ void BeaconProcessor::PrivateData::sendNext()
 /// find the timer that it is to stop.
 bool BeaconProcessor::PrivateData::transmit(const QByteArray& message)
 {
-    startAckTimer();
+    const auto attempt = startAckTimer();
     if (protocol->sendMessage(message))
         return true;
-    stopAckTimer();
+    stopAckTimerOf(attempt);
     return false;
 }
 
-void BeaconProcessor::PrivateData::startAckTimer()
+unsigned BeaconProcessor::PrivateData::startAckTimer()
 {
+    const auto attempt = ++attempts;
     QMetaObject::invokeMethod(ackTimer.get(), "start", Q_ARG(int, ackTimeoutMs));
+    return attempt;
 }
 
 void BeaconProcessor::PrivateData::stopAckTimer()
 {
     QMetaObject::invokeMethod(ackTimer.get(), "stop");
+}
+
+/// By the time that a caller's failure comes to the worker thread, the timer may guard a command sent meanwhile, which
+/// would otherwise stay pending for good.
+void BeaconProcessor::PrivateData::stopAckTimerOf(unsigned attempt)
+{
+    QMetaObject::invokeMethod(ackTimer.get(), [this, attempt] {
+        if (attempt == attempts)
+            ackTimer->stop();
+    });
 }
 
 void BeaconProcessor::PrivateData::handleAck(const QByteArray& /*reply*/)
