@@ -3,161 +3,40 @@
 
 #include "Domain/src/DomainLayer/SerialPort.h"
 
-#include "tests/Domain/Pty.h"
+#include "tests/Domain/SerialLine.h"
 #include "tests/support/LogCapture.h"
-#include "utilities/Debug.h"
 
-#include <QCoreApplication>
 #include <QElapsedTimer>
 #include <QFile>
 #include <QTest>
 
-#include <fcntl.h>
-#include <pthread.h>
-#include <spawn.h>
-#include <sys/resource.h>
-#include <sys/wait.h>
 #include <termios.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <atomic>
-#include <csignal>
-#include <ctime>
-#include <functional>
 #include <mutex>
 #include <numeric>
 #include <thread>
 #include <vector>
 
 using Domain::SerialPort;
+using TestSupport::ClosedPort;
 using TestSupport::LogCapture;
+using TestSupport::numberedBytes;
+using TestSupport::OpenedPort;
 using TestSupport::Pty;
+using TestSupport::readAll;
+using TestSupport::ReadingThread;
+using TestSupport::waitFor;
 
 namespace
 {
-
-constexpr auto sessionLeaderArgument = "--as-session-leader";
-
-/// Waits without serving events.
-bool waitFor(const std::function<bool()>& condition, int limitMs = 20000)
-{
-    const QDeadlineTimer deadline(limitMs);
-    while (!condition()) {
-        if (deadline.hasExpired())
-            return false;
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
-    return true;
-}
-
-class ClosedPort : public SerialPort
-{
-public:
-    explicit ClosedPort(const Pty& pty) : SerialPort(pty.name(), Baud115200) {}
-};
-
-class OpenedPort : public ClosedPort
-{
-public:
-    explicit OpenedPort(const Pty& pty, OpenMode mode = ReadWrite) : ClosedPort(pty)
-    {
-        if (!open(mode))
-            qFatal("The line cannot be opened");
-    }
-};
-
-/// Keeps the thread that it lives on until it is released.
-class Guest : public QObject
-{
-    Q_OBJECT
-
-public:
-    std::atomic<bool> released = false;
-
-public slots:
-    void stay()
-    {
-        (void)waitFor([this] { return released.load(); });
-    }
-};
 
 class ReadablePort : public SerialPort
 {
 public:
     using SerialPort::readData;
     using SerialPort::SerialPort;
-};
-
-/// A process that may have one open file may not wait for two.
-class OneDescriptorOnly
-{
-public:
-    OneDescriptorOnly()
-    {
-        ::getrlimit(RLIMIT_NOFILE, &before);
-        const rlimit tight{1, before.rlim_max};
-        ::setrlimit(RLIMIT_NOFILE, &tight);
-    }
-    ~OneDescriptorOnly() { ::setrlimit(RLIMIT_NOFILE, &before); }
-    OneDescriptorOnly(const OneDescriptorOnly&) = delete;
-    OneDescriptorOnly& operator=(const OneDescriptorOnly&) = delete;
-
-private:
-    rlimit before{};
-};
-
-QByteArray numberedBytes(int count)
-{
-    QByteArray bytes(count, '\0');
-    for (int index = 0; index < count; ++index)
-        bytes[index] = static_cast<char>(index * 7 + index / 256);
-    return bytes;
-}
-
-/// Collects what a port gives, until nothing is missing.
-QByteArray readAll(SerialPort& port, qsizetype count)
-{
-    QByteArray bytes;
-    (void)QTest::qWaitFor(
-        [&] {
-            bytes += port.readAll();
-            return bytes.size() >= count;
-        },
-        20000);
-    return bytes;
-}
-
-std::chrono::nanoseconds processorTime(pthread_t thread)
-{
-    clockid_t clock{};
-    timespec used{};
-    if (::pthread_getcpuclockid(thread, &clock) != 0 || ::clock_gettime(clock, &used) != 0)
-        qFatal("No processor time");
-    return std::chrono::seconds(used.tv_sec) + std::chrono::nanoseconds(used.tv_nsec);
-}
-
-/// Lets the port's reading thread run something, and knows that thread. Made before the port is opened.
-class ReadingThread
-{
-public:
-    ReadingThread(
-        SerialPort& port, std::function<void()> onChunk = [] {})
-    {
-        QObject::connect(
-            &port, &QIODevice::readyRead, &port,
-            [this, work = std::move(onChunk)] {
-                handle = ::pthread_self();
-                object = QThread::currentThread();
-                work();
-                ++chunks;
-            },
-            Qt::DirectConnection);
-    }
-
-    std::atomic<pthread_t> handle{};
-    std::atomic<QThread*> object = nullptr;
-    std::atomic<int> chunks = 0;
 };
 
 } // namespace
@@ -179,6 +58,7 @@ private slots:
     void openDropsWhatArrivedBefore();
     void everyByteArrivesInOrder();
     void readyReadComesOncePerChunkOfAtMost46Bytes();
+    void theLineIsReadOnAThreadOfHighPriority();
     void readDataGivesAtMostWhatIsAskedFor();
     void aLineFeedAnywhereMakesALineReadable();
     void writtenBytesReachTheLineAtOnce();
@@ -195,15 +75,6 @@ private slots:
     void closeServesTheCallersEvents();
     void aClosedPortOpensAgain();
     void aPortThatIsOpenMayBeDestroyed();
-    void aLateReadThreadIsReportedAndRefusesTheNextOpen();
-    void pollPortOnAClosedPortIsReported();
-    void aFailingSelectIsReportedAndReadingGoesOn();
-    void interruptedWaitsAreInvisible();
-    void aLineThatHangsUpIsSilentAndCostsNoProcessor();
-    void aFileInPlaceOfALineCostsNoProcessor();
-    void theLineNeverBecomesTheControllingTerminal();
-    void anUnreadLineWaitsInTheDriverAndLosesNothing();
-    void theBufferMayBeWatchedFromAnotherThread();
 
 private:
     std::unique_ptr<LogCapture> log;
@@ -290,6 +161,18 @@ void SerialPortTest::readyReadComesOncePerChunkOfAtMost46Bytes()
     std::adjacent_difference(totals.begin(), totals.end(), chunks.begin());
     QVERIFY(std::all_of(chunks.begin() + 1, chunks.end(), [](qint64 size) { return size >= 1 && size <= 46; }));
     QCOMPARE(reader.chunks.load(), int(totals.size()) - 1);
+}
+
+void SerialPortTest::theLineIsReadOnAThreadOfHighPriority()
+{
+    const Pty pty;
+    ClosedPort port(pty);
+    const ReadingThread reader(port);
+    QVERIFY(port.open(QIODevice::ReadWrite));
+    pty.write("x");
+    QVERIFY(waitFor([&] { return reader.chunks == 1; }));
+    QVERIFY(reader.object != QThread::currentThread());
+    QCOMPARE(reader.object.load()->priority(), QThread::HighPriority);
 }
 
 void SerialPortTest::readDataGivesAtMostWhatIsAskedFor()
@@ -486,196 +369,5 @@ void SerialPortTest::aPortThatIsOpenMayBeDestroyed()
     QCOMPARE(log->texts(), QStringList());
 }
 
-void SerialPortTest::aLateReadThreadIsReportedAndRefusesTheNextOpen()
-{
-    const Pty pty;
-    Guest guest;
-    ClosedPort port(pty);
-    const ReadingThread reader(port);
-    QVERIFY(port.open(QIODevice::ReadWrite));
-    pty.write("x");
-    QVERIFY(waitFor([&] { return reader.chunks == 1; }));
-    // Work that the thread finds when it has left the read loop, before it is told to quit.
-    guest.moveToThread(reader.object);
-    QMetaObject::invokeMethod(&guest, "stay", Qt::QueuedConnection);
-    port.close();
-    QVERIFY(log->waitFor(", Read thread took too long to finish"));
-    QVERIFY(!port.isOpen());
-    QVERIFY(!port.open(QIODevice::ReadWrite));
-    QVERIFY(log->waitFor(", Previous read thread is not finished."));
-    QCOMPARE(log->lines().size(), std::size_t(2));
-    guest.released = true;
-}
-
-void SerialPortTest::pollPortOnAClosedPortIsReported()
-{
-    const Pty pty;
-    SerialPort port(pty.name(), SerialPort::Baud115200);
-    port.pollPort();
-    QVERIFY(log->waitFor(", Attempting to read from a serial port that is not open"));
-    QVERIFY(port.open(QIODevice::ReadWrite));
-    pty.write("x");
-    QCOMPARE(readAll(port, 1), QByteArray("x"));
-}
-
-void SerialPortTest::aFailingSelectIsReportedAndReadingGoesOn()
-{
-    const Pty pty;
-    OpenedPort port(pty);
-    pty.write("w");
-    QVERIFY(waitFor([&] { return port.bytesAvailable() == 1; }));
-    // The limit hits the log's reader, too, unless that waits already: then another attempt is due.
-    bool reported = false;
-    for (int attempt = 0; attempt < 10 && !reported; ++attempt) {
-        log.reset();
-        log = std::make_unique<LogCapture>();
-        Utilities::Debug::info("connected");
-        QVERIFY(log->waitFor("connected"));
-        const OneDescriptorOnly limit;
-        pty.write("x");
-        reported = waitFor([&] { return log->count(", Select failed in serial port read thread") > 0; }, 2000);
-    }
-    QVERIFY(reported);
-    pty.write("y");
-    QByteArray received;
-    QTRY_VERIFY_WITH_TIMEOUT((received += port.readAll()).endsWith("xy"), 20000);
-}
-
-void SerialPortTest::interruptedWaitsAreInvisible()
-{
-    struct sigaction action
-    {
-    };
-    action.sa_handler = [](int) {};
-    QCOMPARE(::sigaction(SIGUSR1, &action, nullptr), 0);
-    const Pty pty;
-    ClosedPort port(pty);
-    const ReadingThread reader(port);
-    QVERIFY(port.open(QIODevice::ReadWrite));
-    pty.write("x");
-    QVERIFY(waitFor([&] { return reader.chunks == 1; }));
-    for (int round = 0; round < 100; ++round) {
-        ::pthread_kill(reader.handle, SIGUSR1);
-        pty.write("y");
-        QVERIFY(waitFor([&] { return port.bytesAvailable() == round + 2; }));
-    }
-    QCOMPARE(log->texts(), QStringList());
-}
-
-void SerialPortTest::aLineThatHangsUpIsSilentAndCostsNoProcessor()
-{
-    Pty pty;
-    ClosedPort port(pty);
-    const ReadingThread reader(port);
-    QVERIFY(port.open(QIODevice::ReadWrite));
-    pty.write("x");
-    QVERIFY(waitFor([&] { return reader.chunks == 1; }));
-    pty.hangUp();
-    QCOMPARE(port.write("y"), qint64(-1));
-    const auto before = processorTime(reader.handle);
-    QTest::qWait(1000);
-    const auto used = processorTime(reader.handle) - before;
-    QVERIFY2(used < std::chrono::milliseconds(100), qPrintable(QString::number(used.count())));
-    QElapsedTimer timer;
-    timer.start();
-    port.close();
-    QVERIFY(timer.elapsed() < 3000);
-    QVERIFY(log->waitFor(", Serial port write failed.  Error code = Input/output error"));
-    QCOMPARE(log->lines().size(), std::size_t(1));
-}
-
-void SerialPortTest::aFileInPlaceOfALineCostsNoProcessor()
-{
-    QFile file("/tmp/line");
-    QVERIFY(file.open(QIODevice::WriteOnly));
-    file.write("abc");
-    file.close();
-    SerialPort port("/tmp/line", SerialPort::Baud115200);
-    const ReadingThread reader(port);
-    QVERIFY(port.open(QIODevice::ReadOnly));
-    QCOMPARE(readAll(port, 3), QByteArray("abc"));
-    const auto before = processorTime(reader.handle);
-    QTest::qWait(1000);
-    QVERIFY(processorTime(reader.handle) - before < std::chrono::milliseconds(100));
-    port.close();
-    QCOMPARE(log->texts(), QStringList());
-}
-
-void SerialPortTest::theLineNeverBecomesTheControllingTerminal()
-{
-    const Pty pty;
-    QByteArray program = QCoreApplication::applicationFilePath().toLocal8Bit();
-    QByteArray argument = sessionLeaderArgument;
-    QByteArray line = pty.name().toLocal8Bit();
-    char* arguments[] = {program.data(), argument.data(), line.data(), nullptr};
-    posix_spawnattr_t attributes;
-    ::posix_spawnattr_init(&attributes);
-    ::posix_spawnattr_setflags(&attributes, POSIX_SPAWN_SETSID);
-    pid_t child = 0;
-    QCOMPARE(::posix_spawn(&child, program.constData(), nullptr, &attributes, arguments, environ), 0);
-    int status = 0;
-    QCOMPARE(::waitpid(child, &status, 0), child);
-    QVERIFY(WIFEXITED(status));
-    QCOMPARE(WEXITSTATUS(status), 0);
-}
-
-void SerialPortTest::anUnreadLineWaitsInTheDriverAndLosesNothing()
-{
-    const Pty pty;
-    OpenedPort port(pty);
-    const QByteArray sent = numberedBytes(400 * 1024);
-    std::thread peer([&] { pty.write(sent); });
-    const bool filled = waitFor([&] { return port.bytesAvailable() >= 256 * 1024; });
-    QTest::qWait(200);
-    const auto most = port.bytesAvailable();
-    const QByteArray received = readAll(port, sent.size());
-    peer.join();
-    QVERIFY(filled);
-    QVERIFY2(most < 256 * 1024 + 46, qPrintable(QString::number(most)));
-    QVERIFY(received == sent);
-}
-
-void SerialPortTest::theBufferMayBeWatchedFromAnotherThread()
-{
-    const Pty pty;
-    OpenedPort port(pty);
-    std::atomic<bool> finished = false;
-    std::thread watcher([&] {
-        while (!finished) {
-            (void)port.bytesAvailable();
-            (void)port.canReadLine();
-        }
-    });
-    const QByteArray sent = numberedBytes(20000);
-    std::thread peer([&] { pty.write(sent); });
-    const QByteArray received = readAll(port, sent.size());
-    finished = true;
-    watcher.join();
-    peer.join();
-    QVERIFY(received == sent);
-}
-
-namespace
-{
-
-/// The process leads a session without a terminal: the first one that it opens carelessly becomes its own.
-int openAsSessionLeader(const char* name)
-{
-    SerialPort port(QFile::decodeName(name), SerialPort::Baud115200);
-    if (!port.open(QIODevice::ReadWrite))
-        return 2;
-    return ::open("/dev/tty", O_RDWR | O_CLOEXEC) < 0 ? 0 : 1;
-}
-
-} // namespace
-
-int main(int argc, char** argv)
-{
-    const QCoreApplication application(argc, argv);
-    if (argc == 3 && QByteArray(argv[1]) == sessionLeaderArgument)
-        return openAsSessionLeader(argv[2]);
-    SerialPortTest test;
-    return QTest::qExec(&test, argc, argv);
-}
-
+QTEST_GUILESS_MAIN(SerialPortTest)
 #include "SerialPortTest.moc"

@@ -61,6 +61,22 @@ public:
     QList<QByteArray> messages;
 };
 
+/// A real port that counts what is written to it.
+class CountingPort : public SerialPort
+{
+public:
+    using SerialPort::SerialPort;
+
+    int writes = 0;
+
+protected:
+    qint64 writeData(const char* bytes, qint64 count) override
+    {
+        ++writes;
+        return SerialPort::writeData(bytes, count);
+    }
+};
+
 void makeResetFile()
 {
     QDir().mkpath(resetFolder);
@@ -97,9 +113,11 @@ private slots:
     void aResetLineThatCannotBeOpenedIsReported();
     void aResetLineThatCannotBeWrittenIsReported();
     void aDeviceThatCannotBeOpenedIsReportedAndTheResetLineStillPulsed();
+    void theDeviceIsOpenedBeforeTheResetLineIsPulsed();
     void theDeviceStaysOpenWhenTheProtocolGoes();
     void sentMessagesAreFramed_data();
     void sentMessagesAreFramed();
+    void aFrameLeavesInASingleWrite();
     void theLengthFieldOfAHugeMessageIsCutTo16Bits();
     void aFailedSendIsReported();
     void aFrameIsDeliveredWithoutItsWrapping();
@@ -168,6 +186,18 @@ void SerialProtocolTest::aDeviceThatCannotBeOpenedIsReportedAndTheResetLineStill
     QVERIFY(log->waitFor(", Unable to send serial packet"));
 }
 
+/// Otherwise the microcontroller's first words would come before anybody listens.
+void SerialProtocolTest::theDeviceIsOpenedBeforeTheResetLineIsPulsed()
+{
+    QVERIFY(QFile::remove(resetFile));
+    SerialPort port("/dev/ttyS1", SerialPort::Baud115200);
+    const SerialProtocol protocol(port);
+    QVERIFY(log->waitFor(", Beacon processor reset line device file does not exist at" + resetFile));
+    QCOMPARE(log->lines().size(), std::size_t(3));
+    QVERIFY(log->texts().at(1).endsWith(", Unable to open beacon serial port"));
+    QVERIFY(log->texts().at(2).endsWith(resetFile));
+}
+
 void SerialProtocolTest::theDeviceStaysOpenWhenTheProtocolGoes()
 {
     const Pty pty;
@@ -197,6 +227,17 @@ void SerialProtocolTest::sentMessagesAreFramed()
     Link link;
     QVERIFY(link.protocol.sendMessage(payload));
     QCOMPARE(link.pty.read(wire.size()).toHex(), wire.toHex());
+}
+
+void SerialProtocolTest::aFrameLeavesInASingleWrite()
+{
+    const Pty pty;
+    CountingPort port(pty.name(), SerialPort::Baud115200);
+    SerialProtocol protocol(port);
+    QVERIFY(protocol.sendMessage(QByteArray(100, 'x')));
+    QCOMPARE(port.writes, 1);
+    QVERIFY(protocol.sendMessage({}));
+    QCOMPARE(port.writes, 2);
 }
 
 void SerialProtocolTest::theLengthFieldOfAHugeMessageIsCutTo16Bits()

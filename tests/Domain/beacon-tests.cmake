@@ -2,6 +2,8 @@
 # SPDX-License-Identifier: MIT
 immunityrig_test(BeaconRecordsTest SOURCES Domain/BeaconRecordsTest.cpp LIBRARIES Domain LABELS unit)
 immunityrig_test(SerialPortTest SOURCES Domain/SerialPortTest.cpp Domain/Pty.cpp LIBRARIES Domain LABELS unit)
+immunityrig_test(SerialPortTroubleTest SOURCES Domain/SerialPortTroubleTest.cpp Domain/Pty.cpp LIBRARIES Domain
+  LABELS unit)
 immunityrig_test(FrameParserTest SOURCES Domain/FrameParserTest.cpp Domain/Frames.cpp LIBRARIES Domain LABELS unit)
 immunityrig_test(SerialProtocolTest SOURCES Domain/SerialProtocolTest.cpp Domain/Frames.cpp Domain/Pty.cpp
   LIBRARIES Domain LABELS unit)

@@ -260,6 +260,10 @@ private slots:
         acknowledged("602803");
         acknowledged("6401");
         acknowledged("20 000001 02020202 f8ff");
+        acknowledged("3002");
+        command("02 ffffff 4a 01 c0ffee");
+        QTRY_COMPARE(tty->messages(), (Messages{"fe", "03"}));
+        tty->forget();
         set("radio.ack", "late");
         set("radio.ack_delay", 200);
         command("7e");
@@ -271,6 +275,12 @@ private slots:
         QVERIFY(!flag("radio.beacon"));
         QCOMPARE(number("radio.channel"), 0);
         QCOMPARE(number("radio.frequency"), 0);
+        QCOMPARE(number("radio.power_level"), 0);
+        QCOMPARE(number("radio.accel_mode"), 0);
+        QCOMPARE(text("radio.beacon_address"), QString());
+        QCOMPARE(text("radio.beacon_channels"), QString());
+        QCOMPARE(text("radio.beacon_packets"), QString());
+        QCOMPARE(text("radio.packet"), QString());
         set("radio.ack", "on");
         QTest::qWait(300); // the answer that was under way would have come by now
         QCOMPARE(tty->messages(), Messages{});
