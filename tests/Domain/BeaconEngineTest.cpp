@@ -67,7 +67,7 @@ protected:
     }
 };
 
-/// A real port that knows who has written to it.
+/// A real port that knows who has written to it, and fails one write if it is told to.
 class WatchedPort : public SerialPort
 {
 public:
@@ -75,13 +75,13 @@ public:
 
     std::atomic<int> writes = 0;
     std::atomic<QThread*> lastWriter = nullptr;
+    int failingWrite = 0;
 
 protected:
     qint64 writeData(const char* bytes, qint64 count) override
     {
         lastWriter = QThread::currentThread();
-        ++writes;
-        return SerialPort::writeData(bytes, count);
+        return ++writes == failingWrite ? -1 : SerialPort::writeData(bytes, count);
     }
 };
 
@@ -101,9 +101,11 @@ private slots:
     void aRefusedCommandIsFollowedByTheNext();
     void aTimedOutCommandIsFollowedByTheNextAndNotRepeated();
     void anAcknowledgementWithDataLeavesTheCommandToTimeOut();
+    void aRefusalWithoutAReasonEndsNothing();
     void repliesForNobodyDoNoHarm();
     void aFailedSendLeavesTheCommandPendingWithoutATimer();
     void aFailedQueuedSendClearsThePendingFlag();
+    void afterAFailedQueuedSendTheNextCommandGoesOutAtOnce();
     void aTimeoutWithNothingPendingIsSilent();
     void anAcknowledgementHandledBeforeTheWriteReturnsLeavesNoTimerBehind();
     void pendingEndsWithoutTheCallersEventLoop();
@@ -213,6 +215,18 @@ void BeaconEngineTest::anAcknowledgementWithDataLeavesTheCommandToTimeOut()
     QVERIFY(radio.takes({"\x7E", "\x62"}));
 }
 
+void BeaconEngineTest::aRefusalWithoutAReasonEndsNothing()
+{
+    Radio radio;
+    QVERIFY(radio.processor.sendPing());
+    QVERIFY(radio.processor.checkRadioInterface());
+    radio.says("\xFF");
+    QVERIFY(radio.tells({"error 4"}));
+    QVERIFY(radio.settles());
+    QVERIFY(radio.processor.isCommandPending());
+    QCOMPARE(radio.peer.commands().size(), 1);
+}
+
 void BeaconEngineTest::repliesForNobodyDoNoHarm()
 {
     Radio radio;
@@ -257,6 +271,26 @@ void BeaconEngineTest::aFailedQueuedSendClearsThePendingFlag()
     QMetaObject::invokeMethod(&processor, "processMessage", Qt::QueuedConnection, Q_ARG(QByteArray, "\xFE"));
     QTRY_VERIFY(!processor.isCommandPending());
     QVERIFY(log->waitFor(", Unable to send serial packet"));
+}
+
+/// It overtakes those that wait, which follow it.
+void BeaconEngineTest::afterAFailedQueuedSendTheNextCommandGoesOutAtOnce()
+{
+    Pty pty;
+    WatchedPort port(pty.name(), SerialPort::Baud115200);
+    port.failingWrite = 2;
+    BeaconProcessor processor(port);
+    const RadioPeer peer(pty);
+    QVERIFY(processor.sendPing());
+    QVERIFY(processor.checkRadioInterface());
+    QVERIFY(processor.toggleFramePulseLine());
+    pty.write(RadioPeer::ack());
+    QTRY_VERIFY(!processor.isCommandPending());
+    QVERIFY(processor.stopTransmittingRfTestPacket());
+    QVERIFY(processor.isCommandPending());
+    QTRY_COMPARE(peer.commands(), (QList<QByteArray>{"\x7E", "\x61"}));
+    pty.write(RadioPeer::ack());
+    QTRY_COMPARE(peer.commands(), (QList<QByteArray>{"\x7E", "\x61", "\x65"}));
 }
 
 void BeaconEngineTest::aTimeoutWithNothingPendingIsSilent()

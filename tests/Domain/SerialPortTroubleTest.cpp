@@ -70,6 +70,17 @@ private:
     rlimit before{};
 };
 
+/// From now on the signal does nothing but interrupt.
+void interruptWithSigusr1()
+{
+    struct sigaction action
+    {
+    };
+    action.sa_handler = [](int) {};
+    if (::sigaction(SIGUSR1, &action, nullptr) != 0)
+        qFatal("No signal");
+}
+
 std::chrono::nanoseconds processorTime(pthread_t thread)
 {
     clockid_t clock{};
@@ -94,6 +105,7 @@ private slots:
     void pollPortOnAClosedPortIsReported();
     void aFailingSelectIsReportedAndReadingGoesOn();
     void interruptedWaitsAreInvisible();
+    void anInterruptedWriteHasAllItsPatience();
     void aLineThatHangsUpIsSilentAndCostsNoProcessor();
     void aFileInPlaceOfALineCostsNoProcessor();
     void theLineNeverBecomesTheControllingTerminal();
@@ -161,11 +173,7 @@ void SerialPortTroubleTest::aFailingSelectIsReportedAndReadingGoesOn()
 
 void SerialPortTroubleTest::interruptedWaitsAreInvisible()
 {
-    struct sigaction action
-    {
-    };
-    action.sa_handler = [](int) {};
-    QCOMPARE(::sigaction(SIGUSR1, &action, nullptr), 0);
+    interruptWithSigusr1();
     const Pty pty;
     ClosedPort port(pty);
     const ReadingThread reader(port);
@@ -178,6 +186,31 @@ void SerialPortTroubleTest::interruptedWaitsAreInvisible()
         QVERIFY(waitFor([&] { return port.bytesAvailable() == round + 2; }));
     }
     QCOMPARE(log->texts(), QStringList());
+}
+
+void SerialPortTroubleTest::anInterruptedWriteHasAllItsPatience()
+{
+    interruptWithSigusr1();
+    const Pty pty;
+    OpenedPort port(pty);
+    const QByteArray block(4096, 'x');
+    while (port.write(block) > 0) {
+    }
+    std::atomic<bool> finished = false;
+    std::thread disturber([&, writer = ::pthread_self()] {
+        while (!finished) {
+            ::pthread_kill(writer, SIGUSR1);
+            std::this_thread::sleep_for(std::chrono::milliseconds(10));
+        }
+    });
+    QElapsedTimer clock;
+    clock.start();
+    const auto written = port.write(block);
+    const auto elapsed = clock.elapsed();
+    finished = true;
+    disturber.join();
+    QCOMPARE(written, qint64(-1));
+    QVERIFY2(elapsed >= 490, qPrintable(QString::number(elapsed)));
 }
 
 void SerialPortTroubleTest::aLineThatHangsUpIsSilentAndCostsNoProcessor()

@@ -22,6 +22,7 @@
 #include <cerrno>
 #include <chrono>
 #include <condition_variable>
+#include <csignal>
 #include <cstring>
 #include <ctime>
 #include <mutex>
@@ -38,7 +39,7 @@ using std::chrono::milliseconds;
 /// How long a stop request may go unseen, and how long a line that gives only errors is left alone.
 constexpr timespec pollTimeout{0, 500'000'000};
 constexpr milliseconds pollPause{500};
-constexpr milliseconds writePatience{500};
+constexpr timespec writePatience{0, 500'000'000};
 constexpr milliseconds closeStep{1};
 constexpr int closePatienceMs = 5000;
 constexpr std::size_t chunkSize = 46;
@@ -257,7 +258,9 @@ ssize_t SerialPort::PrivateData::write(const char* bytes, std::size_t count) con
     auto written = attempt();
     if (written < 0 && errno == EAGAIN) {
         pollfd room{file.get(), POLLOUT, 0};
-        ::poll(&room, 1, static_cast<int>(writePatience.count()));
+        sigset_t signalsLeftForLater;
+        ::sigfillset(&signalsLeftForLater);
+        ::ppoll(&room, 1, &writePatience, &signalsLeftForLater);
         written = attempt();
     }
     return written;
