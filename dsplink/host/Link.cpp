@@ -45,6 +45,13 @@ Link& Link::instance()
     return link;
 }
 
+Link::~Link()
+{
+    // A process ends with its connection standing. The connection's thread must be gone before what it calls upon.
+    if (connection)
+        connection->close();
+}
+
 DSP_STATUS Link::setup()
 {
     const std::lock_guard operation(operationMutex);
