@@ -8,6 +8,9 @@
 
 #include <QDir>
 #include <QFileInfo>
+#include <QJsonDocument>
+#include <QJsonObject>
+#include <QLocalSocket>
 #include <QSignalSpy>
 #include <QTcpServer>
 #include <QTcpSocket>
@@ -90,6 +93,7 @@ private slots:
     void logLinesArriveWithPriorityAndIdentity();
     void stalledLogReadsNothing();
     void resetLineResetsTheRadio();
+    void brokenRulesOfTheDspAreMonitorEvents();
     void absentRadioHasNoSerialDevice();
     void stateFolderIsKept();
     void ownStateGoesWithTheDevice();
@@ -250,6 +254,29 @@ void DeviceTest::resetLineResetsTheRadio()
     QCOMPARE(statusOf(device), 0);
     QCOMPARE(device.registry().integer("reset_line.writes"), 1);
     QTRY_COMPARE_WITH_TIMEOUT(device.registry().integer("radio.resets"), 1, limit);
+}
+
+void DeviceTest::brokenRulesOfTheDspAreMonitorEvents()
+{
+    // A start that comes before everything else, once the listener is there.
+    Device device(shell("until test -e /mnt/boot/go; do sleep 0.05; done; "
+                        "printf '\\004\\0\\0\\0\\001\\0\\0\\0' | socat - UNIX-CONNECT:/dev/dsplink,type=5; sleep 60"));
+    QCOMPARE(device.start(), std::nullopt);
+    QLocalSocket listener;
+    listener.connectToServer(device.controlSocket());
+    QTRY_COMPARE_WITH_TIMEOUT(listener.state(), QLocalSocket::ConnectedState, limit);
+    listener.write(R"({"jsonrpc":"2.0","id":1,"method":"events","params":{"kinds":["monitor"]}})"
+                   "\n");
+    QTRY_VERIFY_WITH_TIMEOUT(listener.canReadLine(), limit);
+    (void)listener.readLine();
+    QFile go(device.stateFolder() + "/mnt/boot/go");
+    QVERIFY(go.open(QIODevice::WriteOnly));
+    QTRY_VERIFY_WITH_TIMEOUT(listener.canReadLine(), limit);
+    const auto event = QJsonDocument::fromJson(listener.readLine()).object()["params"].toObject();
+    QCOMPARE(event, (QJsonObject{{"kind", "monitor"},
+                                 {"source", "dsp"},
+                                 {"event", "violation"},
+                                 {"details", QJsonObject{{"what", "start out of order"}}}}));
 }
 
 void DeviceTest::absentRadioHasNoSerialDevice()

@@ -196,9 +196,11 @@ void Device::watchForWindow()
 /// What the models see goes to whoever listens on the control socket.
 void Device::watchModels()
 {
-    connect(&radio, &RadioModel::violated, &monitor, [this](const QString& what) {
-        monitor.raise(QStringLiteral("radio"), QStringLiteral("violation"), {{QStringLiteral("what"), what}});
-    });
+    const auto raise = [this](const char* model, const QString& what) {
+        monitor.raise(QLatin1String(model), QStringLiteral("violation"), {{QStringLiteral("what"), what}});
+    };
+    connect(&radio, &RadioModel::violated, &monitor, [raise](const QString& what) { raise("radio", what); });
+    connect(&dsp, &DspModel::violated, &monitor, [raise](const QString& what) { raise("dsp", what); });
 }
 
 /// In the opposite order: nobody may use a file system when it goes.
