@@ -97,7 +97,8 @@ private slots:
     {
         QTest::addColumn<QString>("name");
         QTest::addColumn<int>("failing");
-        const QStringList names{"attach", "queue", "load", "start", "transport", "locate"};
+        const QStringList names{"attach", "queue",           "load", "start",       "transport",
+                                "locate", "transport-close", "stop", "queue-close", "detach"};
         for (int kind = 1; kind <= names.size(); ++kind)
             QTest::newRow(qPrintable(names[kind - 1])) << names[kind - 1] << kind;
     }
@@ -107,7 +108,7 @@ private slots:
         QFETCH(QString, name);
         QFETCH(int, failing);
         set("dsp.refuse", name);
-        const QList<QByteArray> bodies{attachBody, armQueue, image, "", "", dspQueue};
+        const QList<QByteArray> bodies{attachBody, armQueue, image, "", "", dspQueue, "", "", "01000100", ""};
         for (int kind = 1; kind < failing; ++kind)
             request(kind, bodies[kind - 1], done, kind == 6 ? "01000000" : "00000000");
         request(failing, bodies[failing - 1], failed);
