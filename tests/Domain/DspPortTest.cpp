@@ -537,7 +537,7 @@ private slots:
     void closingAtOnceAfterOpeningEnds()
     {
         makePort();
-        for (int round = 0; round < 20; ++round) {
+        for (int round = 0; round < 8; ++round) {
             QVERIFY(port->open(QIODevice::ReadWrite));
             QElapsedTimer timer;
             timer.start();

@@ -9,6 +9,7 @@
 #include <QTest>
 #include <QThread>
 
+#include <atomic>
 #include <memory>
 #include <mutex>
 
@@ -198,6 +199,22 @@ private slots:
     {
         QCOMPARE(signalsOf(0x11000, "\1\2"), QStringList{"version 1.2"});
         QCOMPARE(emitter, dsp->thread());
+    }
+
+    void theStartOfReadingComesBeforeTheRead()
+    {
+        std::atomic<qint64> waiting = -1;
+        const auto connection = connect(
+            dsp.get(), &Dsp::messageReadStart, this,
+            [&] {
+                if (waiting < 0)
+                    waiting = port->bytesAvailable();
+            },
+            Qt::DirectConnection);
+        (void)signalsOf(0x11000, "\1\2");
+        disconnect(connection);
+        QCOMPARE(waiting.load(), 10);
+        QCOMPARE(seen(), (QStringList{"read", "version 1.2", "read", "stop 65535 -1"}));
     }
 
     void theVersionIsMajorThenMinor()

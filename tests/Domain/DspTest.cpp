@@ -7,6 +7,8 @@
 #include "tests/Domain/DspTestParts.h"
 
 #include <QElapsedTimer>
+#include <QMetaMethod>
+#include <QSemaphore>
 #include <QTest>
 #include <QThread>
 
@@ -32,6 +34,22 @@ QByteArray commandMessage(quint32 command, std::initializer_list<quint32> payloa
 {
     return DspPeer::dspMessage(command, DspPeer::words(payload));
 }
+
+/// Returns from a write only when the answer to it has been handled.
+class PatientPort : public DspPort
+{
+public:
+    PatientPort() : DspPort(QStringLiteral("/dsp.out")) {}
+
+    QSemaphore answered;
+
+protected:
+    qint64 writeData(const char* data, qint64 size) override
+    {
+        const qint64 written = DspPort::writeData(data, size);
+        return answered.tryAcquire(1, 20000) ? written : -1;
+    }
+};
 
 } // namespace
 
@@ -88,10 +106,52 @@ private slots:
     {
         QVERIFY(dsp->thread() != QThread::currentThread());
         QVERIFY(dsp->thread()->isRunning());
+        QCOMPARE(dsp->thread()->priority(), QThread::HighestPriority);
         QVERIFY(port->isOpen());
         QCOMPARE(port->openMode(), QIODevice::ReadWrite | QIODevice::Unbuffered);
         dsp.reset();
         QVERIFY(!port->isOpen());
+    }
+
+    void theMetaObjectNamesSignalsAndSlots()
+    {
+        const auto described = [](const QMetaObject& meta) {
+            QStringList all;
+            for (int index = meta.methodOffset(); index < meta.methodCount(); ++index) {
+                const QMetaMethod method = meta.method(index);
+                const bool isSignal = method.methodType() == QMetaMethod::Signal;
+                const char* const kind = isSignal                                 ? "signal"
+                                         : method.access() == QMetaMethod::Public ? "slot"
+                                                                                  : "own slot";
+                all.append(QStringLiteral("%1 %2(%3)").arg(kind, method.name(), method.parameterNames().join(',')));
+            }
+            return all;
+        };
+        QCOMPARE(described(AbstractDsp::staticMetaObject),
+                 (QStringList{"signal versionReceived(version)", "slot requestVersion()",
+                              "slot setReceiverEnableTest(type)", "slot runHardwareTest(testId)"}));
+        QCOMPARE(described(Dsp::staticMetaObject), (QStringList{"signal pairingUpgradeDataReceived(data)",
+                                                                "signal sensorReadingsReceived(readings)",
+                                                                "signal lineNoiseDetected()",
+                                                                "signal startTriggerDetected(frameNumber,time)",
+                                                                "signal stopTriggerDetected(frameNumber,time)",
+                                                                "signal diagnosticDataReceived(frameNumber,data)",
+                                                                "signal messageReadStart()",
+                                                                "signal sensorDataReceived()",
+                                                                "signal rfDiagnosticDataEmitted()",
+                                                                "signal wirelessSensorReadingsGenerated()",
+                                                                "slot requestVersion()",
+                                                                "slot setReceiverEnable(type)",
+                                                                "slot setReceiverEnableTest(type)",
+                                                                "slot setLongRangeAntennaEnable(enabled)",
+                                                                "slot setUpsamplingEnable(enabled)",
+                                                                "slot configureLineNoiseDetection(configuration)",
+                                                                "slot setTrigger(trigger)",
+                                                                "slot setAcquisitionMode(mode)",
+                                                                "slot setDspEnable(enabled)",
+                                                                "slot runHardwareTest(testId)",
+                                                                "own slot receiveData()",
+                                                                "own slot dspAssert()"}));
     }
 
     void aPortThatDoesNotOpenIsLogged()
@@ -157,6 +217,31 @@ private slots:
         QCOMPARE(sourcedTexts(*log), QStringList());
     }
 
+    void anAnswerThatIsThereBeforeTheWaitNeedsNone()
+    {
+        dsp.reset();
+        auto patient = std::make_unique<PatientPort>();
+        QSemaphore& answered = patient->answered;
+        port = std::move(patient);
+        dsp = std::make_unique<Dsp>(*port, *buttons);
+        connect(
+            dsp.get(), &Dsp::lineNoiseDetected, this, [&] { answered.release(); }, Qt::DirectConnection);
+        // What follows the answer is handled after it.
+        peer->onMessage([](DspPeer& device, const auto& message) {
+            device.sendDsp(message.word(0) == 0x10009 ? ack : nak, DspPeer::words({message.word(0)}));
+            device.sendDsp(0x11006, QByteArray(1, '\1'));
+        });
+        (void)sourcedTexts(*log);
+        QElapsedTimer timer;
+        timer.start();
+        constexpr int exchanges = 10;
+        for (int number = 0; number < exchanges; ++number)
+            QVERIFY(dsp->runHardwareTest(number));
+        QVERIFY2(timer.elapsed() < exchanges * 800, qPrintable(QString::number(timer.elapsed())));
+        QVERIFY(!dsp->requestVersion());
+        QCOMPARE(sourcedTexts(*log), QStringList{"Dsp: Received Nak for DSP command 0x10000"});
+    }
+
     void acknowledgementsAndRefusalsAreToldApartThousandsOfTimes()
     {
         peer->onMessage([](DspPeer& device, const auto& message) {
@@ -189,6 +274,16 @@ private slots:
         QVERIFY(!dsp->requestVersion());
         QCOMPARE(sourcedTexts(*log),
                  (QStringList{"Dsp: Timed out waiting for DSP ACK", "Dsp: Timed out waiting for DSP ACK"}));
+    }
+
+    void anAnswerThatComesLateAnswersTheCommandThenInFlight()
+    {
+        peer->onMessage({});
+        QVERIFY(!dsp->runHardwareTest(1));
+        // The only answer that the next command sees is the one to the command before.
+        peer->onMessage([](DspPeer& device, const auto&) { device.sendDsp(ack, DspPeer::words({0x10009})); });
+        QVERIFY(dsp->requestVersion());
+        QCOMPARE(sourcedTexts(*log), QStringList{"Dsp: Timed out waiting for DSP ACK"});
     }
 
     void otherMessagesDoNotProlongTheTimeLimit()
