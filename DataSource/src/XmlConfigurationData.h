@@ -34,7 +34,7 @@ extern const QString arraySeparater;
 ///
 /// The file is replaced as a whole: whenever the device loses power, the next start finds the old settings or the new
 /// ones. Characters that XML cannot carry (control characters, halves of surrogate pairs) are left out of the file: one
-/// of them would make all the settings unreadable. A carriage return comes back as a line feed, as in any XML.
+/// of them would make all the settings unreadable. Carriage returns do not come back.
 ///
 /// Errors are logged with fixed line numbers, and the program goes on with what it has in memory. Keys that name no
 /// stored setting are ignored and have no value.
