@@ -6,6 +6,7 @@
 #include <QtEndian>
 
 #include <algorithm>
+#include <array>
 #include <cstring>
 
 namespace Domain
@@ -17,137 +18,149 @@ namespace
 /// Room for many reads, so that what is left of one is seldom moved to the front.
 constexpr qsizetype usualCapacity = 64 * 1024;
 
-using Word = quint64;
-constexpr qsizetype wordSize = sizeof(Word);
+/// Sixteen bytes of the line as eight lanes.
+using Lanes [[gnu::vector_size(16)]] = quint16;
+constexpr quint16 vectorSize = sizeof(Lanes);
 
-Word wordAt(const char* bytes)
+/// The longest payload in whole vectors.
+constexpr quint16 summedBytes = (Frame::longestPayload + vectorSize - 1) / vectorSize * vectorSize;
+
+/// All ones, then all zeros: read from `summedBytes - n` on, it keeps the first n bytes.
+constexpr auto keepMask = [] {
+    std::array<uchar, 2 * summedBytes> mask{};
+    std::fill_n(mask.begin(), summedBytes, uchar{0xFF});
+    return mask;
+}();
+
+Lanes lanesAt(const void* bytes)
 {
-    return qFromLittleEndian<Word>(bytes);
+    Lanes lanes;
+    std::memcpy(&lanes, bytes, sizeof lanes);
+    return lanes;
 }
 
-/// The eight bytes of a word added up in four lanes of 16 bits.
-Word lanesOf(Word word)
+/// The lanes' sum, modulo 65536, when two of them together do not exceed 16 bits.
+quint16 sumOf(const Lanes& lanes)
 {
-    constexpr Word lowBytes = 0x00FF00FF00FF00FF;
-    return (word & lowBytes) + ((word >> 8) & lowBytes);
+    constexpr quint64 ones = 0x0001000100010001;
+    std::array<quint64, 2> halves{};
+    std::memcpy(halves.data(), &lanes, sizeof lanes);
+    return static_cast<quint16>(((halves[0] + halves[1]) * ones) >> 48);
 }
 
-/// The lanes' sum, modulo 65536.
-quint16 sumOfLanes(Word lanes)
+/// The sum of the first `length` of `summedBytes` readable bytes. Lengths on a line follow no pattern, and a loop that
+/// ends with the payload costs more by its wrongly predicted end than adding zeros up to a fixed one.
+quint16 checksumOfFirst(quint16 length, const char* bytes)
 {
-    constexpr Word ones = 0x0001000100010001;
-    return static_cast<quint16>((lanes * ones) >> 48);
+    const uchar* const mask = keepMask.data() + (summedBytes - length);
+    Lanes sums{};
+    for (quint16 offset = 0; offset < summedBytes; offset += vectorSize) {
+        const Lanes kept = lanesAt(bytes + offset) & lanesAt(mask + offset);
+        sums += (kept & 0xFF) + (kept >> 8);
+    }
+    return sumOf(sums);
+}
+
+quint16 fieldAt(const char* bytes)
+{
+    return qFromBigEndian<quint16>(bytes);
+}
+
+bool isHeaderValid(const char* header)
+{
+    const auto* const bytes = reinterpret_cast<const uchar*>(header);
+    return bytes[0] + bytes[1] + bytes[2] + bytes[3] + bytes[4] == fieldAt(header + Frame::headerChecksumOffset);
 }
 
 } // namespace
 
-/// Eight bytes at a time: most of what the parser does is adding up.
 quint16 Frame::checksumOf(QByteArrayView bytes)
 {
-    // A lane holds 255 * 2 for each of so many words.
-    constexpr qsizetype block = 128 * wordSize;
     quint16 sum = 0;
-    const char* next = bytes.data();
-    qsizetype left = bytes.size();
-    while (left >= wordSize) {
-        Word lanes = 0;
-        for (const char* const end = next + std::min(left, block) / wordSize * wordSize; next != end; next += wordSize)
-            lanes += lanesOf(wordAt(next));
-        sum = static_cast<quint16>(sum + sumOfLanes(lanes));
-        left = bytes.data() + bytes.size() - next;
-    }
-    for (; left > 0; --left)
-        sum = static_cast<quint16>(sum + static_cast<uchar>(*next++));
+    for (const char byte : bytes)
+        sum = static_cast<quint16>(sum + static_cast<uchar>(byte));
     return sum;
 }
 
 void FrameParser::append(QByteArrayView bytes)
 {
-    makeRoom(bytes.size());
+    if (capacity() - end < bytes.size() + summedBytes)
+        makeRoom(bytes.size());
     std::copy(bytes.begin(), bytes.end(), buffer.data() + end);
     end += bytes.size();
 }
 
+/// Behind the bytes there is always as much as the summing of a payload may read.
 void FrameParser::makeRoom(qsizetype size)
 {
-    if (buffer.size() - end >= size)
-        return;
-    std::copy(unparsed(), unparsed() + available(), buffer.data());
-    end = available();
+    std::copy(buffer.data() + position, buffer.data() + end, buffer.data());
+    wanted -= position;
+    end -= position;
     position = 0;
-    buffer.resize(std::max(usualCapacity, end + size));
     receivedPayload = {};
+    const auto needed = std::max(usualCapacity, end + size + summedBytes);
+    if (needed > capacity())
+        buffer.resize(static_cast<std::size_t>(needed));
 }
 
-FrameParser::Outcome FrameParser::advance()
+inline bool FrameParser::findStartByte()
 {
-    switch (state) {
-    case State::SeekingStartByte:
-        return seekStartByte();
-    case State::ReadingHeader:
-        return readHeader();
-    case State::ReadingPayload:
-        break;
-    }
-    return readPayload();
+    const char* const unparsed = buffer.data() + position;
+    if (*unparsed == Frame::startByte)
+        return true;
+    const auto* const found = std::memchr(unparsed, Frame::startByte, static_cast<std::size_t>(end - position));
+    if (found == nullptr)
+        return false;
+    position = static_cast<const char*>(found) - buffer.data();
+    return true;
 }
 
-quint16 FrameParser::fieldAt(qsizetype offset) const
+inline FrameParser::Outcome FrameParser::waitFor(qsizetype frameBytes)
 {
-    return qFromBigEndian<quint16>(unparsed() + offset);
+    wanted = position + frameBytes;
+    return Outcome::NeedsMoreBytes;
 }
 
-FrameParser::Outcome FrameParser::seekStartByte()
+inline FrameParser::Outcome FrameParser::refuse(Outcome reason)
 {
-    if (available() > 0 && *unparsed() != Frame::startByte) {
-        const auto* const found = std::memchr(unparsed(), Frame::startByte, static_cast<std::size_t>(available()));
-        position = found == nullptr ? end : static_cast<const char*>(found) - buffer.constData();
-    }
-    if (available() == 0) {
-        position = end = 0;
-        if (buffer.size() > usualCapacity)
-            buffer = QByteArray();
-        return Outcome::NeedsMoreBytes;
-    }
-    state = State::ReadingHeader;
-    return readHeader();
+    ++position;
+    wanted = position;
+    return reason;
 }
 
-FrameParser::Outcome FrameParser::readHeader()
+inline FrameParser::Outcome FrameParser::parsePayload(quint16 length)
 {
-    if (available() < Frame::headerSize)
-        return Outcome::NeedsMoreBytes;
-    const auto* const bytes = reinterpret_cast<const uchar*>(unparsed());
-    if (bytes[0] + bytes[1] + bytes[2] + bytes[3] + bytes[4] != fieldAt(Frame::headerChecksumOffset))
-        return refuse(Outcome::InvalidHeaderChecksum);
-    payloadLength = fieldAt(Frame::lengthOffset);
-    dataChecksum = fieldAt(Frame::dataChecksumOffset);
-    if (payloadLength > Frame::longestPayload)
-        return refuse(Outcome::PayloadTooLong);
-    state = State::ReadingPayload;
-    return readPayload();
-}
-
-FrameParser::Outcome FrameParser::readPayload()
-{
-    if (available() < payloadLength + Frame::overhead)
-        return Outcome::NeedsMoreBytes;
-    const QByteArrayView payload(unparsed() + Frame::headerSize, payloadLength);
-    if (Frame::checksumOf(payload) != dataChecksum)
+    const char* const header = buffer.data() + position;
+    const char* const payload = header + Frame::headerSize;
+    if (checksumOfFirst(length, payload) != fieldAt(header + Frame::dataChecksumOffset))
         return refuse(Outcome::InvalidDataChecksum);
-    if (*payload.end() != Frame::endOfPacket)
+    if (payload[length] != Frame::endOfPacket)
         return refuse(Outcome::MissingEndOfPacket);
-    receivedPayload = payload;
-    position += payloadLength + Frame::overhead;
-    state = State::SeekingStartByte;
+    receivedPayload = QByteArrayView(payload, length);
+    position += length + Frame::overhead;
+    wanted = position;
     return Outcome::FrameReceived;
 }
 
-FrameParser::Outcome FrameParser::refuse(Outcome reason)
+FrameParser::Outcome FrameParser::parse()
 {
-    ++position;
-    state = State::SeekingStartByte;
-    return reason;
+    if (position == end || !findStartByte()) {
+        if (capacity() > usualCapacity)
+            buffer = {};
+        position = end = 0;
+        return waitFor(1);
+    }
+    if (end - position < Frame::headerSize)
+        return waitFor(Frame::headerSize);
+    const char* const header = buffer.data() + position;
+    if (!isHeaderValid(header))
+        return refuse(Outcome::InvalidHeaderChecksum);
+    const auto length = fieldAt(header + Frame::lengthOffset);
+    if (length > Frame::longestPayload)
+        return refuse(Outcome::PayloadTooLong);
+    if (end - position < length + Frame::overhead)
+        return waitFor(length + Frame::overhead);
+    return parsePayload(length);
 }
 
 } // namespace Domain

@@ -3,8 +3,9 @@
 
 #pragma once
 
-#include <QByteArray>
 #include <QByteArrayView>
+
+#include <vector>
 
 namespace Domain
 {
@@ -60,33 +61,23 @@ public:
     void append(QByteArrayView bytes);
 
     /// Goes on to the next frame or refusal. `payload` holds the frame's payload until the next `append` or `advance`.
-    [[nodiscard]] Outcome advance();
+    [[nodiscard]] Outcome advance() { return end < wanted ? Outcome::NeedsMoreBytes : parse(); }
     [[nodiscard]] QByteArrayView payload() const { return receivedPayload; }
 
 private:
-    enum class State
-    {
-        SeekingStartByte,
-        ReadingHeader,
-        ReadingPayload
-    };
-
-    [[nodiscard]] qsizetype available() const { return end - position; }
-    [[nodiscard]] const char* unparsed() const { return buffer.constData() + position; }
-    [[nodiscard]] quint16 fieldAt(qsizetype offset) const;
+    [[nodiscard]] qsizetype capacity() const { return static_cast<qsizetype>(buffer.size()); }
     void makeRoom(qsizetype size);
-
-    [[nodiscard]] Outcome seekStartByte();
-    [[nodiscard]] Outcome readHeader();
-    [[nodiscard]] Outcome readPayload();
+    [[nodiscard]] bool findStartByte();
+    [[nodiscard]] Outcome parse();
+    [[nodiscard]] Outcome parsePayload(quint16 length);
+    [[nodiscard]] Outcome waitFor(qsizetype frameBytes);
     [[nodiscard]] Outcome refuse(Outcome reason);
 
-    QByteArray buffer; ///< storage; `position` to `end` are filled and not yet parsed
+    std::vector<char> buffer; ///< storage; `position` to `end` are filled and not yet parsed
     qsizetype position = 0;
     qsizetype end = 0;
-    State state = State::SeekingStartByte;
-    quint16 payloadLength = 0;
-    quint16 dataChecksum = 0;
+    qsizetype room = 0;   ///< what can be appended as it is
+    qsizetype wanted = 1; ///< the `end` from which on there is something to do
     QByteArrayView receivedPayload;
 };
 
