@@ -70,6 +70,7 @@ private slots:
     void aFrameAfterATruncatedOneIsFound_data();
     void aFrameAfterATruncatedOneIsFound();
     void aFrameInsideTheClaimOfAFalseHeaderIsFound();
+    void aFrameAtTheVeryEndOfAReadOfAnySizeIsFound();
     void everyRefusalIsReportedOnceAByte();
     void anIntactFrameIsNeverLostToDamageElsewhere_data();
     void anIntactFrameIsNeverLostToDamageElsewhere();
@@ -189,6 +190,20 @@ void FrameParserTest::aFrameInsideTheClaimOfAFalseHeaderIsFound()
 {
     const QByteArray claim = frameOf(QByteArray(), 100, 1).left(7);
     QCOMPARE(payloadsIn(claim + frameOf("one") + frameOf("two") + silence), (QList<QByteArray>{"one", "two"}));
+}
+
+void FrameParserTest::aFrameAtTheVeryEndOfAReadOfAnySizeIsFound()
+{
+    constexpr int storage = 64 * 1024;
+    const QByteArray frame = frameOf("last");
+    FrameParser parser;
+    // Ends that lie before, at and behind the end of what the parser keeps at hand, with old bytes behind them or none.
+    for (int size = storage - 250; size < storage + 250; ++size) {
+        Parsed parsed;
+        parse(parser, QByteArray(size - frame.size(), '\xFF') + frame, parsed);
+        parse(parser, frame, parsed);
+        QCOMPARE(parsed.payloads, (QList<QByteArray>{"last", "last"}));
+    }
 }
 
 void FrameParserTest::everyRefusalIsReportedOnceAByte()
