@@ -9,7 +9,6 @@
 
 #include <QDir>
 #include <QFile>
-#include <QSignalSpy>
 #include <QTemporaryDir>
 #include <QTest>
 
@@ -21,6 +20,7 @@
 #include <memory>
 #include <thread>
 #include <tuple>
+#include <utility>
 #include <vector>
 
 using TestSupport::RawFile;
@@ -325,7 +325,9 @@ void DeviceTreeTest::oddContents()
 
 void DeviceTreeTest::powerLatchKeepsWhatWasWrittenAndWhen()
 {
-    QSignalSpy spy(tree.get(), &DeviceTree::powerLatchWritten);
+    std::vector<std::pair<int, QDateTime>> writes;
+    connect(tree.get(), &DeviceTree::powerLatchWritten, this,
+            [&](int brightness, const QDateTime& written) { writes.emplace_back(brightness, written); });
     const QDateTime before = QDateTime::currentDateTimeUtc();
     QFile file(at(latch));
     QVERIFY(file.open(QIODevice::WriteOnly));
@@ -333,9 +335,9 @@ void DeviceTreeTest::powerLatchKeepsWhatWasWrittenAndWhen()
     file.close();
     const QDateTime after = QDateTime::currentDateTimeUtc();
     QCOMPARE(registry->integer("led.power_latch"), 1);
-    QTRY_COMPARE_WITH_TIMEOUT(spy.count(), 1, 20000);
-    QCOMPARE(spy.at(0).at(0).toInt(), 1);
-    const auto time = spy.at(0).at(1).toDateTime();
+    QTRY_COMPARE_WITH_TIMEOUT(writes.size(), 1U, 20000);
+    const auto [brightness, time] = writes.front();
+    QCOMPARE(brightness, 1);
     QVERIFY(time >= before && time <= after);
     QCOMPARE(registry->text("led.written"), time.toString(Qt::ISODateWithMs));
     QCOMPARE(contentOf(at(latch)), "1\n");
@@ -361,7 +363,8 @@ void DeviceTreeTest::powerLatchRefusesWhatIsNoNumber()
 
 void DeviceTreeTest::resetLinePulsesOnOne()
 {
-    QSignalSpy spy(tree.get(), &DeviceTree::resetLineWritten);
+    int pulses = 0;
+    connect(tree.get(), &DeviceTree::resetLineWritten, this, [&] { ++pulses; });
     const QDateTime before = QDateTime::currentDateTimeUtc();
     for (const char* text : {"1", "1\n"}) {
         RawFile file(at(resetLine), O_WRONLY);
@@ -370,7 +373,7 @@ void DeviceTreeTest::resetLinePulsesOnOne()
     QCOMPARE(registry->integer("reset_line.writes"), 2);
     const auto time = QDateTime::fromString(registry->text("reset_line.written"), Qt::ISODateWithMs);
     QVERIFY(time >= before && time <= QDateTime::currentDateTimeUtc());
-    QTRY_COMPARE_WITH_TIMEOUT(spy.count(), 2, 20000);
+    QTRY_COMPARE_WITH_TIMEOUT(pulses, 2, 20000);
 }
 
 void DeviceTreeTest::resetLineRefusesEverythingElseAndCannotBeRead()

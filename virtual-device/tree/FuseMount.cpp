@@ -90,13 +90,16 @@ void FuseMount::unmount()
 
 void FuseMount::serve(int session)
 {
+    // What the kernel tells late, above all that files were closed, is heard before the end.
+    constexpr int mostAtTheEnd = 1000;
     auto* const handle = ::fuse_get_session(instance);
     fuse_buf buffer{};
     std::array<pollfd, 2> waits{pollfd{session, POLLIN, 0}, pollfd{stopEvent, POLLIN, 0}};
-    while (::fuse_session_exited(handle) == 0) {
+    for (int remaining = mostAtTheEnd; remaining > 0 && ::fuse_session_exited(handle) == 0;) {
         if (::poll(waits.data(), waits.size(), -1) < 0)
             continue;
-        if (waits[1].revents != 0)
+        const bool isEnding = waits[1].revents != 0;
+        if (isEnding && (--remaining == 0 || waits[0].revents == 0))
             break;
         const int length = ::fuse_session_receive_buf(handle, &buffer);
         if (length == -EINTR || length == -EAGAIN)
