@@ -31,6 +31,10 @@ class FormWindow
 public:
     FormWindow()
     {
+        // The program's own font, and the texts that it gives the panel at once: both decide what the layouts do.
+        QFont font = QApplication::font();
+        font.setPointSize(9);
+        QApplication::setFont(font);
         window.setupUi(&screen);
         add(rtc, window.rtcTestRegion);
         add(buttons, window.buttonsTestWidget);
@@ -40,6 +44,8 @@ public:
         add(usbGadget, window.usbGadgetTestWidget);
         add(trigger, window.triggerTestWidget);
         add(sdCard, window.sdCardTestWidget);
+        rf.labelFrequencyValue->setText(QStringLiteral("2402 MHz"));
+        rf.labelPowerValue->setText(QStringLiteral("-18 dBm"));
         screen.show();
         settle();
     }
@@ -151,8 +157,8 @@ void RegionMapTest::regionIsWhereItsWidgetIs()
 void RegionMapTest::radioLabelsStayInTheirRegionsWhateverTheySay()
 {
     FormWindow window;
-    for (const auto* frequency : {"2402", "2402 MHz", "2474 MHz"})
-        for (const auto* power : {"-18", "-18 dBm", "0 dBm"})
+    for (const auto* frequency : {"2402 MHz", "2440 MHz", "2474 MHz"})
+        for (const auto* power : {"-18 dBm", "-6 dBm", "0 dBm"})
             for (const auto* transmitting : {"|", "| X", "| ) ) )"})
                 for (const auto* radios : {"Internal RF", "External RF"}) {
                     window.rf.labelFrequencyValue->setText(frequency);

@@ -37,11 +37,11 @@ constexpr std::array map{
     Region{"trigger", 0, 220, 120, 18, "TriggerTest/connectedLabel", "green while triggers arrive each second"},
     Region{"sd-card", 120, 220, 120, 18, "SdCardTest/connectedLabel", "green while the card and its file are well"},
     Region{"rf", 0, 237, 240, 83, "RfTest/", "the radio panel"},
-    Region{"rf.frequency", 76, 246, 41, 12, "RfTest/labelFrequencyValue", "frequency of the test packet"},
-    Region{"rf.power", 66, 282, 51, 12, "RfTest/labelPowerValue", "power of the test packet"},
-    Region{"rf.transmitting", 152, 246, 78, 17, "RfTest/labelTransmitting", "the transmission's animation"},
-    Region{"rf.beacon", 152, 272, 78, 15, "RfTest/labelBeacon", "green while the radio controller answers"},
-    Region{"rf.radios", 152, 295, 78, 15, "RfTest/labelRadios", "green while the radio's signal line is active"},
+    Region{"rf.frequency", 92, 243, 56, 14, "RfTest/labelFrequencyValue", "frequency of the test packet"},
+    Region{"rf.power", 85, 283, 60, 14, "RfTest/labelPowerValue", "power of the test packet"},
+    Region{"rf.transmitting", 158, 243, 74, 17, "RfTest/labelTransmitting", "the transmission's animation"},
+    Region{"rf.beacon", 157, 268, 74, 20, "RfTest/labelBeacon", "green while the radio controller answers"},
+    Region{"rf.radios", 157, 295, 74, 20, "RfTest/labelRadios", "green while the radio's signal line is active"},
 };
 
 static_assert(std::all_of(map.begin(), map.end(),
