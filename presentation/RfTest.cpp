@@ -8,6 +8,7 @@
 #include "presentation/WidgetUpdates.h"
 #include "presentation/ui_RfTest.h"
 
+#include <QDeadlineTimer>
 #include <QFile>
 #include <QTextStream>
 #include <QTimer>
@@ -34,7 +35,8 @@ constexpr auto indicatorInterval = 500ms;
 constexpr auto radioTimeoutInterval = 2000ms;
 /// Between two looks at the pending flag: short beside a command's few milliseconds on the line.
 constexpr auto pendingPollInterval = 200us;
-/// Longer than the beacon processor itself waits for an acknowledgement (3 s).
+/// How long waits may last after a ping reply of a link that was dead: longer than the beacon processor itself waits
+/// for an acknowledgement (3 s).
 constexpr auto recoveryLimit = 4000ms;
 
 constexpr qint8 lowChannel = 2;
@@ -62,14 +64,6 @@ qint8 channelBelow(qint8 channel)
     return channel == highChannel ? middleChannel : lowChannel;
 }
 
-/// Whether waiting for the microcontroller makes sense.
-enum class Link
-{
-    Sound,     ///< commands are accepted: every one of them ends, by its acknowledgement or the link's own time-out
-    Refused,   ///< a command was refused and may stay pending for ever: nothing is waited for
-    Recovering ///< a ping reply came since: waits have a limit until the pending command is done
-};
-
 } // namespace
 
 struct RfTest::PrivateData
@@ -83,11 +77,11 @@ struct RfTest::PrivateData
     template <typename... Parameters, typename... Arguments>
     void send(bool (AbstractBeaconProcessor::*command)(Parameters...), Arguments... arguments)
     {
-        if (link != Link::Sound && !beaconProcessor.isCommandPending())
-            link = Link::Sound;
+        if (!waitLimit.isForever() && !beaconProcessor.isCommandPending())
+            waitLimit = QDeadlineTimer::Forever;
         if ((beaconProcessor.*command)(arguments...))
             return;
-        link = Link::Refused;
+        waitLimit = QDeadlineTimer(0);
         showBeacon(failStyleSheet);
     }
 
@@ -119,7 +113,9 @@ struct RfTest::PrivateData
     Ui_RfTest ui{};
     std::array<QFile, 2> files; ///< reserved: nothing opens them
     std::array<QTextStream, 2> streams;
-    Link link = Link::Sound;
+    /// When to give up waiting. Never as long as commands are accepted: each of them ends, by its acknowledgement or
+    /// the link's own time-out. At once after a refused one.
+    QDeadlineTimer waitLimit = QDeadlineTimer::Forever;
 };
 
 RfTest::RfTest(AbstractBeaconProcessor& beaconProcessor, Domain::AbstractDsp& dsp, QWidget* parent)
@@ -219,8 +215,9 @@ void RfTest::communicationFail()
 
 void RfTest::communicationSuccess()
 {
-    if (d->link == Link::Refused)
-        d->link = Link::Recovering;
+    // The reply may have been under way when the link died: it is no promise that the pending command ends.
+    if (!d->waitLimit.isForever())
+        d->waitLimit = QDeadlineTimer(recoveryLimit);
     d->showBeacon(passStyleSheet);
 }
 
@@ -251,15 +248,14 @@ void RfTest::radioTimeout()
 
 void RfTest::PrivateData::wait()
 {
-    const auto limit = std::chrono::steady_clock::now() + recoveryLimit;
     while (beaconProcessor.isCommandPending()) {
-        if (link == Link::Recovering && std::chrono::steady_clock::now() > limit)
-            link = Link::Refused;
-        if (link == Link::Refused)
+        if (waitLimit.hasExpired()) {
+            showBeacon(failStyleSheet);
             return;
+        }
         std::this_thread::sleep_for(pendingPollInterval);
     }
-    link = Link::Sound;
+    waitLimit = QDeadlineTimer::Forever;
 }
 
 void RfTest::PrivateData::startPacket()

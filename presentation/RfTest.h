@@ -25,8 +25,8 @@ namespace Presentation
 /// the event loop: the beacon processor completes its commands on a thread of its own.
 ///
 /// A command that the link refuses is not waited for, and none after it: the link counts as dead ("Beacon Micro" red)
-/// until no command is pending any more. A ping reply makes the panel wait again, but with a limit until the pending
-/// command has been seen done: after a refused command it may never be.
+/// until no command is pending any more. A ping reply lets the panel wait again, but for 4 seconds at most until the
+/// pending command has been seen done: after a refused command it may never be.
 class RfTest : public QWidget
 {
     Q_OBJECT

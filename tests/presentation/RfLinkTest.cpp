@@ -92,14 +92,34 @@ private slots:
         panel.beacon.accepts = false;
         panel.test.start();
         panel.beacon.accepts = true;
+        QElapsedTimer sinceReply;
+        sinceReply.start();
         emit panel.beacon.pingResponse();
-        QElapsedTimer blocked;
-        blocked.start();
+        QCOMPARE(panel.style("labelBeacon"), pass);
         QCOMPARE(panel.afterCalling(&RfTest::frequencyUp), Journal({"stop", "start 40 0"}));
-        QVERIFY(blocked.elapsed() >= 4000);
+        QVERIFY(sinceReply.elapsed() >= 4000);
+        QCOMPARE(panel.style("labelBeacon"), fail);
         const int looksBefore = panel.beacon.looks;
         QCOMPARE(panel.afterCalling(&RfTest::frequencyUp), Journal({"stop", "start 74 0"}));
         QVERIFY(panel.beacon.looks <= looksBefore + 4);
+    }
+
+    /// A command is done within the limit: from then on the link is as good as a new one.
+    void aPingReplyAndADoneCommandTakeTheLimitAway()
+    {
+        Panel panel;
+        panel.beacon.accepts = false;
+        panel.test.start();
+        panel.beacon.accepts = true;
+        emit panel.beacon.pingResponse();
+        panel.beacon.staysPending = false;
+        QCOMPARE(panel.afterCalling(&RfTest::frequencyUp), restartAt(40, 0));
+        panel.beacon.staysPending = true;
+        QElapsedTimer waiting;
+        waiting.start();
+        panel.beacon.onLook = [&] { panel.beacon.staysPending = waiting.elapsed() <= 4300; };
+        QCOMPARE(panel.afterCalling(&RfTest::frequencyUp), restartAt(74, 0));
+        QCOMPARE(panel.style("labelBeacon"), pass);
     }
 
     void anAcceptedCommandIsWaitedForHoweverLongItTakes()
