@@ -82,52 +82,6 @@ struct Bench
     }
 };
 
-/// What stands at a moment of the start-up: the tests that have their place, and those that show that they run.
-QStringList standing()
-{
-    static const QMap<QString, QString> stylesOfStarted{{"UsbDeviceTest", TestSupport::green},
-                                                        {"RfTest", "background-color: red"},
-                                                        {"UsbGadgetTest", TestSupport::green},
-                                                        {"SdCardTest", TestSupport::green}};
-    QStringList names;
-    for (auto* const part : Bench::screen().findChildren<QWidget*>(QString(), Qt::FindDirectChildrenOnly)) {
-        const QString name = nameOf(part).mid(14);
-        const bool isTest = nameOf(part).startsWith(u"Presentation::");
-        const bool isPlaced = isTest && part->height() != 320 && part->height() != 68 && part->height() != 86;
-        if (isPlaced)
-            names.append(name);
-        for (const char* const label : {"connectLabel", "connectedLabel", "labelBeacon"}) {
-            const auto* const found = part->findChild<QLabel*>(QString::fromLatin1(label));
-            if (isTest && found != nullptr && found->styleSheet() == stylesOfStarted.value(name, "never"))
-                names.append(name + " runs");
-        }
-    }
-    names.sort();
-    return names;
-}
-
-/// Notes what stands whenever a test says that it has started.
-class StartRecorder
-{
-public:
-    StartRecorder()
-    {
-        moments.clear();
-        previous = qInstallMessageHandler([](QtMsgType, const QMessageLogContext&, const QString& text) {
-            if (text == u"Error: attempt to play unreadable audio file." || text == u"Unable to open RTC " ||
-                text == u"Error opening voltage file ")
-                moments[text] = standing();
-        });
-    }
-    ~StartRecorder() { qInstallMessageHandler(previous); }
-    Q_DISABLE_COPY_MOVE(StartRecorder)
-
-    static inline QMap<QString, QStringList> moments;
-
-private:
-    QtMessageHandler previous;
-};
-
 } // namespace
 
 /// The window with its devices, of which the sandbox has none: they are built, fail and are destroyed all the same.
@@ -153,24 +107,6 @@ private slots:
         recorder.watch(built, members);
         bench.gui.reset();
         QCOMPARE(recorder.destroyed(), QStringList(members.rbegin(), members.rend()));
-    }
-
-    void everyTestIsPlacedAndThenStartedInItsTurn()
-    {
-        writeFile(QStringLiteral("/sys/devices/platform/musb_hdrc/mode"), "b_peripheral\n");
-        for (const char* const folder : {"/sys/bus/usb/devices/1-1.4", "/sys/block/mmcblk0", "/mnt/data"})
-            QDir().mkpath(QString::fromLatin1(folder));
-        const StartRecorder recorder;
-        const Bench bench;
-        QCOMPARE(recorder.moments.value("Error: attempt to play unreadable audio file."), QStringList());
-        QCOMPARE(recorder.moments.value("Unable to open RTC "), QStringList({"RtcTest"}));
-        const QStringList beforeTheGauge({"ButtonsTest", "FuelGuageTest", "RfTest", "RfTest runs", "RtcTest",
-                                          "UsbDeviceTest", "UsbDeviceTest runs"});
-        QCOMPARE(recorder.moments.value("Error opening voltage file "), beforeTheGauge);
-        auto atTheEnd = beforeTheGauge + QStringList({"SdCardTest", "SdCardTest runs", "TriggerTest", "UsbGadgetTest",
-                                                      "UsbGadgetTest runs"});
-        atTheEnd.sort();
-        QCOMPARE(standing(), atTheEnd);
     }
 
     void theDspsTestsAreSwitchedOnBeforeTheRadioPanelStarts()
