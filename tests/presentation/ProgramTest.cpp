@@ -22,6 +22,7 @@ namespace
 
 const QString started = QStringLiteral("Starting ImmunityRig");
 const QString probeFile = QStringLiteral("/mnt/data/testfile");
+const QString screenReport = QStringLiteral("/mnt/screen-probe");
 constexpr int patienceMs = 60'000;
 
 /// The program as it ships, on a device whose files the case has laid out.
@@ -43,7 +44,23 @@ public:
         waitForFinished();
     }
 
-    void signal(int number) const { ::kill(static_cast<pid_t>(processId()), number); }
+    /// With a plugin of the test inside it.
+    void startWithScreenProbe()
+    {
+        auto environment = processEnvironment();
+        environment.insert(QStringLiteral("QT_PLUGIN_PATH"),
+                           qEnvironmentVariable("IMMUNITYRIG_BUILD") + QStringLiteral("/tests/plugins"));
+        environment.insert(QStringLiteral("QT_QPA_GENERIC_PLUGINS"), QStringLiteral("screenprobe"));
+        setProcessEnvironment(environment);
+        start();
+    }
+
+    /// One that has ended has no id: the number 0 would stand for the test's own process group.
+    void signal(int number) const
+    {
+        if (processId() > 0)
+            ::kill(static_cast<pid_t>(processId()), number);
+    }
 
     /// Whether it is set to handle the signal itself. Asked once it has logged something: before, it is still a fork of
     /// the test, with the test's handlers.
@@ -86,6 +103,7 @@ private slots:
         TestSupport::removePath(QStringLiteral("/sys/block"));
         TestSupport::removePath(QStringLiteral("/sys/class"));
         TestSupport::removePath(QStringLiteral("/mnt/data"));
+        TestSupport::removePath(screenReport);
     }
 
     /// The compiled-in configuration points Qt to a folder without plugins, and no variable says where they are.
@@ -102,6 +120,43 @@ private slots:
         QCOMPARE(first.facility, 1);
         QVERIFY(pollsAgain());
         QCOMPARE(program.state(), QProcess::Running);
+    }
+
+    void goesOnWhenItsWindowIsClosed()
+    {
+        Program program;
+        program.startWithScreenProbe();
+        QTRY_VERIFY_WITH_TIMEOUT(QFile::exists(screenReport), patienceMs);
+        QVERIFY(TestSupport::readFile(screenReport).contains("closed=1\n"));
+        for (int second = 0; second < 2; ++second)
+            QVERIFY(pollsAgain());
+        QCOMPARE(program.state(), QProcess::Running);
+    }
+
+    void tellsTheFramebufferNotToStretchTheWindow()
+    {
+        Program program;
+        program.startWithScreenProbe();
+        QTRY_VERIFY_WITH_TIMEOUT(QFile::exists(screenReport), patienceMs);
+        QVERIFY(TestSupport::readFile(screenReport).startsWith("QT_QPA_FB_FORCE_FULLSCREEN=0\n"));
+    }
+
+    /// What is logged after the log has been closed carries the name of the program.
+    void closesTheLogBeforeTheWindowIsDestroyed()
+    {
+        const LogCapture log;
+        Program program;
+        program.startWithScreenProbe();
+        QTRY_VERIFY_WITH_TIMEOUT(QFile::exists(screenReport), patienceMs);
+        program.signal(SIGTERM);
+        QVERIFY(log.waitFor(QStringLiteral("window destroyed")));
+        const auto lines = log.lines();
+        const auto last =
+            std::find_if(lines.begin(), lines.end(), [](const auto& line) { return line.text == u"window destroyed"; });
+        QCOMPARE(last->identity, QStringLiteral("immunityrig"));
+        QTRY_COMPARE_WITH_TIMEOUT(program.state(), QProcess::NotRunning, patienceMs);
+        QCOMPARE(program.exitStatus(), QProcess::NormalExit);
+        QCOMPARE(program.exitCode(), 0);
     }
 
     void endsOrderlyOnATerminationSignal_data()

@@ -38,6 +38,10 @@ immunityrig_test(ResourcesTest
 immunityrig_test(ProgramTest SOURCES presentation/ProgramTest.cpp
   LIBRARIES PresentationTestSupport LABELS presentation)
 add_dependencies(ProgramTest immunityrig)
+add_library(ScreenProbe MODULE presentation/ScreenProbe.cpp presentation/ScreenProbe.json)
+target_link_libraries(ScreenProbe PRIVATE ProjectOptions Qt6::Gui)
+set_target_properties(ScreenProbe PROPERTIES LIBRARY_OUTPUT_DIRECTORY "${CMAKE_CURRENT_BINARY_DIR}/plugins/generic")
+add_dependencies(ProgramTest ScreenProbe)
 immunityrig_test(RtcOnDeviceTest ON_DEVICE SOURCES presentation/RtcOnDeviceTest.cpp
   LIBRARIES PresentationTestSupport DeviceTestSupport Presentation LABELS presentation)
 add_dependencies(RtcOnDeviceTest virtual-device)
