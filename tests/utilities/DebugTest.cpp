@@ -8,9 +8,11 @@
 
 #include <QCoreApplication>
 #include <QElapsedTimer>
+#include <QFile>
 #include <QTest>
 #include <QTimer>
 
+#include <fcntl.h>
 #include <sys/socket.h>
 #include <sys/un.h>
 #include <unistd.h>
@@ -44,6 +46,8 @@ private slots:
     void fatalBeforeTheEventLoopEndsNothing();
     void messagesFromManyThreadsAllArrive();
     void messagesAfterCloseStillArriveUnderTheProgramsName();
+    void everyMessageIsEchoedOnStandardError();
+    void withoutALogServiceMessagesGoToTheConsole();
     void aServiceThatTakesNothingHoldsNobodyUp();
 };
 
@@ -204,6 +208,37 @@ void DebugTest::messagesAfterCloseStillArriveUnderTheProgramsName()
     Debug::info("late");
     QVERIFY(log.waitFor("late"));
     QCOMPARE(log.lines().front().identity, "DebugTest");
+}
+
+void DebugTest::everyMessageIsEchoedOnStandardError()
+{
+    const LogCapture log;
+    Debug::open();
+    int ends[2];
+    QCOMPARE(::pipe2(ends, O_CLOEXEC), 0);
+    const int standardError = ::dup(STDERR_FILENO);
+    ::dup2(ends[1], STDERR_FILENO);
+    Debug::info("brief");
+    Debug::warningMessage("f", 1, "composed");
+    ::dup2(standardError, STDERR_FILENO);
+    ::close(standardError);
+    ::close(ends[1]);
+    QFile echo;
+    QVERIFY(echo.open(ends[0], QIODevice::ReadOnly, QFile::AutoCloseHandle));
+    QCOMPARE(echo.readAll(), QByteArray("VQK: brief\nVQK: f, 1, composed\n"));
+}
+
+void DebugTest::withoutALogServiceMessagesGoToTheConsole()
+{
+    QFile console("/dev/console");
+    QVERIFY(!console.exists());
+    QVERIFY(console.open(QIODevice::ReadWrite));
+    Debug::close();
+    Debug::open();
+    Debug::info("nobody listens");
+    const QByteArray text = console.readAll();
+    QVERIFY(console.remove());
+    QVERIFY2(text.contains("VQK: nobody listens\r\n"), text);
 }
 
 void DebugTest::aServiceThatTakesNothingHoldsNobodyUp()
