@@ -5,7 +5,6 @@
 #include "Domain/src/DomainLayer/Audio.h"
 #include "presentation/ButtonsTest.h"
 #include "presentation/TestGui.h"
-#include "tests/presentation/DebugOutput.h"
 #include "tests/presentation/LabelForm.h"
 #include "tests/presentation/ObjectRecorder.h"
 #include "tests/presentation/WidgetProbe.h"
@@ -90,13 +89,7 @@ class AssemblyTest : public QObject
     Q_OBJECT
 
 private slots:
-    void cleanup()
-    {
-        for (const char* const folder : {"bus", "block", "devices"})
-            TestSupport::removePath(QStringLiteral("/sys/%1").arg(QLatin1String(folder)));
-        TestSupport::removePath(QStringLiteral("/mnt/data"));
-        TestSupport::removePath(sound);
-    }
+    void cleanup() { TestSupport::removePath(sound); }
 
     void devicesAndTestsAreBuiltInTheirOrderAndDestroyedInReverse()
     {
