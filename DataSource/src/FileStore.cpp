@@ -48,7 +48,7 @@ public:
     static QFuture<void> start(std::function<void()> work)
     {
         auto* const task = new PoolTask(std::move(work));
-        const auto future = task->promise.future();
+        auto future = task->promise.future();
         handedOver.fetch_add(1, std::memory_order_release);
         QThreadPool::globalInstance()->start(task);
         return future;

@@ -200,7 +200,7 @@ QVariant XmlConfigurationData::data(ConfigurationData key) const
 
 QVariant XmlConfigurationData::data(ConfigurationData key, const QVariant& defaultValue)
 {
-    const QVariant stored = data(key);
+    QVariant stored = data(key);
     if (stored.isValid())
         return stored;
     setData(key, defaultValue);

@@ -31,9 +31,10 @@ bool connectTo(int socket, const char* path)
 {
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
-    if (std::strlen(path) >= sizeof address.sun_path)
+    const std::size_t length = std::strlen(path);
+    if (length >= sizeof address.sun_path)
         return false;
-    std::strcpy(address.sun_path, path);
+    std::memcpy(address.sun_path, path, length);
     // A server that is just coming up may have its backlog full; one that never accepts must not hold us up.
     for (int attempt = 0; attempt < connectAttempts; ++attempt) {
         if (::connect(socket, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0)

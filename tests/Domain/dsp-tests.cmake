@@ -3,7 +3,10 @@
 
 # The maker's library needs the maker's hardware: what runs here is the host library.
 if(NOT DSPLINK_ROOT)
-  immunityrig_test(DspLinkHostTest SOURCES dsplink/DspLinkHostTest.cpp LIBRARIES DspLink LABELS integration)
+  immunityrig_test(DspLinkHostTest SOURCES dsplink/DspLinkHostTest.cpp dsplink/DspLinkTestCase.h
+    LIBRARIES DspLink LABELS integration)
+  immunityrig_test(DspLinkMessageTest SOURCES dsplink/DspLinkMessageTest.cpp dsplink/DspLinkTestCase.h
+    LIBRARIES DspLink LABELS integration)
 endif()
 immunityrig_test(DspPortTest SOURCES Domain/DspPortTest.cpp Domain/DspTestParts.h LIBRARIES Domain LABELS integration)
 immunityrig_test(DspPortOpeningTest SOURCES Domain/DspPortOpeningTest.cpp LIBRARIES Domain LABELS integration)

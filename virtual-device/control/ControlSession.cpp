@@ -310,7 +310,7 @@ std::optional<Error> ControlSession::condition(PendingWait& pending, const QJson
     const bool hasControl = params.contains("control");
     const bool hasLog = params.contains("log");
     if (int(hasRegion) + int(hasControl) + int(hasLog) != 1)
-        return wrong("one of \"region\", \"control\" and \"log\" says what to wait for");
+        return wrong(R"(one of "region", "control" and "log" says what to wait for)");
     if (hasRegion) {
         const QString colour = params.value("colour").toString();
         if (RegionMap::find(params.value("region").toString()) == nullptr)

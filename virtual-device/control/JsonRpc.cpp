@@ -39,7 +39,7 @@ std::variant<Request, Refusal> checked(const QJsonObject& message)
     if (!isIdentity(id))
         return refused(answerTo, ErrorCode::InvalidRequest, "\"id\" must be a number, a string or null");
     if (message.value(versionKey) != version)
-        return refused(answerTo, ErrorCode::InvalidRequest, "\"jsonrpc\" must be \"2.0\"");
+        return refused(answerTo, ErrorCode::InvalidRequest, R"("jsonrpc" must be "2.0")");
     if (!method.isString())
         return refused(answerTo, ErrorCode::InvalidRequest, "\"method\" must be a string");
     if (!params.isUndefined() && !params.isObject())

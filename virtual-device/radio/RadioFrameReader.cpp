@@ -34,7 +34,7 @@ void RadioFrameReader::clear()
 std::optional<RadioFrameReader::Event> RadioFrameReader::next()
 {
     while (cursor < buffer.size()) {
-        const auto event = examined();
+        auto event = examined();
         if (!event)
             return std::nullopt;
         if (event->finding == Finding::Frame) {

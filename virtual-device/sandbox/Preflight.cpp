@@ -86,7 +86,7 @@ std::optional<QString> missingPlugin()
 std::optional<QString> missingPrerequisite()
 {
     for (const auto check : {missingProgram, missingFuse, missingNamespaces, missingPlugin}) {
-        if (const auto problem = check())
+        if (auto problem = check())
             return problem;
     }
     return std::nullopt;

@@ -40,7 +40,7 @@ std::optional<QString> prepareState(const QString& folder)
         if (!QDir(folder).mkpath(QString::fromLatin1(name)))
             return QStringLiteral("%1/%2: cannot be made").arg(folder, QString::fromLatin1(name));
     }
-    if (const auto problem = writeUnlessThere(folder + QStringLiteral("/etc/sounds/TestSound.wav"), testSound()))
+    if (auto problem = writeUnlessThere(folder + QStringLiteral("/etc/sounds/TestSound.wav"), testSound()))
         return problem;
     return writeUnlessThere(folder + QStringLiteral("/dsp.out"), "virtual DSP firmware image\n");
 }

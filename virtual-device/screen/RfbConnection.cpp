@@ -7,9 +7,9 @@
 
 #include <pthread.h>
 #include <rfb/rfbclient.h>
-#include <signal.h>
 #include <sys/socket.h>
 
+#include <csignal>
 #include <utility>
 
 namespace VirtualDevice

@@ -120,12 +120,12 @@ struct TreeOperations
 
     static int readdir(const char* path, void* buffer, fuse_fill_dir_t fill, off_t, fuse_file_info*, fuse_readdir_flags)
     {
-        const std::string folder = std::strcmp(path, "/") == 0 ? "" : path;
+        const std::string folder = std::strcmp(path, "/") == 0 ? path : std::string(path) + '/';
         for (const char* name : {".", ".."})
             fill(buffer, name, nullptr, 0, FUSE_FILL_DIR_PLUS);
         for (const auto& child : childrenOf(path)) {
             const std::string name(child);
-            const TreeEntry* entry = findEntry(folder + '/' + name);
+            const TreeEntry* entry = findEntry(folder + name);
             if (entry == nullptr || tree().isThere(*entry))
                 fill(buffer, name.c_str(), nullptr, 0, fuse_fill_dir_flags{});
         }

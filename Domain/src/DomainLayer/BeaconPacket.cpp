@@ -27,9 +27,9 @@ quint8 byteAt(const QByteArray& bytes, qsizetype index)
 class BeaconPacket::PrivateData : public QSharedData
 {
 public:
-    PrivateData(PacketType packetType, quint8 packetValue) : valid(true), type(packetType), value(packetValue) {}
+    PrivateData(PacketType packetType, quint8 packetValue) : type(packetType), value(packetValue) {}
 
-    bool valid;
+    bool valid = true;
     PacketType type;
     quint8 value;
 };
