@@ -28,6 +28,7 @@ public:
     Process(const Process&) = delete;
     Process& operator=(const Process&) = delete;
 
+    [[nodiscard]] pid_t id() const { return pid; }
     [[nodiscard]] Usage usage() const;
     [[nodiscard]] bool isRunning() const;
 

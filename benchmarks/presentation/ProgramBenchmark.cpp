@@ -1,7 +1,9 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
+#include "benchmarks/presentation/EventLoopWatch.h"
 #include "benchmarks/presentation/FirstFrame.h"
+#include "benchmarks/presentation/OrdinaryFiles.h"
 #include "benchmarks/presentation/Process.h"
 
 #include <benchmark/benchmark.h>
@@ -14,9 +16,14 @@
 #include <thread>
 #include <vector>
 
-/// The program on a healthy virtual device beside a minimal Qt window, both in the same run: start to the first
-/// complete frame, resident memory, processor time and wake-ups of the running programs. The ratios are the program's
-/// figure over the minimal window's; `wakeups_to_implied` is over what the program's own intervals imply.
+/// The program on a healthy virtual device without a sound card beside a minimal Qt window, both in the same run: start
+/// to the first complete frame, resident memory, processor time and wake-ups of the running programs, and how long
+/// their first threads stay away from the event loop. The ratios are the program's figure over the minimal window's;
+/// `wakeups_to_implied` is over what the program's own intervals imply.
+///
+/// A wake-up is counted whenever a thread of the program gave the processor up. Most of them are waits for the virtual
+/// device's answers to reads of files, which the device's kernel gives at once; `runningOnOrdinaryFiles` leaves all but
+/// the clock's out.
 namespace
 {
 
@@ -27,6 +34,7 @@ using Clock = std::chrono::steady_clock;
 constexpr const char* insideVariable = "VIRTUAL_DEVICE_CONTROL";
 constexpr auto settling = 5s;
 constexpr auto observation = 60s;
+constexpr auto samplingInterval = 200us;
 
 /// Five polls, the sound's check, the transmission's indicator, the ping, two reading threads' half-second waits.
 constexpr double impliedWakeUpsPerSecond = 5 + 1 + 2 + 1.0 / 3 + 2 * 2;
@@ -102,15 +110,50 @@ void running(benchmark::State& state)
     }
 }
 
+/// "away" is the time between two waits in the event loop, in which a key or a repaint has to wait.
+void awayFromEventLoop(benchmark::State& state)
+{
+    for ([[maybe_unused]] auto iteration : state) {
+        const Process minimal(minimalWindow, "offscreen");
+        const Process measured(program, "offscreen");
+        std::this_thread::sleep_for(settling);
+        Benchmarks::EventLoopWatch baseline(minimal.id());
+        Benchmarks::EventLoopWatch watch(measured.id());
+        const auto start = Clock::now();
+        while (Clock::now() - start < observation) {
+            baseline.sample();
+            watch.sample();
+            std::this_thread::sleep_for(samplingInterval);
+        }
+        if (!minimal.isRunning() || !measured.isRunning() || watch.stretches() == 0)
+            state.SkipWithError("a program ended, or was never seen away");
+        state.SetIterationTime(std::chrono::duration<double>(Clock::now() - start).count());
+        state.counters["stretches"] = static_cast<double>(watch.stretches());
+        state.counters["away_p99_ms"] = watch.quantile(0.99).count();
+        state.counters["away_longest_ms"] = watch.longest().count();
+        state.counters["minimal_p99_ms"] = baseline.quantile(0.99).count();
+        state.counters["minimal_longest_ms"] = baseline.longest().count();
+    }
+}
+
+/// Comes last: what it changes stays.
+void runningOnOrdinaryFiles(benchmark::State& state)
+{
+    Benchmarks::useOrdinaryFiles();
+    running(state);
+}
+
 BENCHMARK(startToFirstFrame)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(10);
 BENCHMARK(running)->UseManualTime()->Unit(benchmark::kSecond)->Iterations(1);
+BENCHMARK(awayFromEventLoop)->UseManualTime()->Unit(benchmark::kSecond)->Iterations(1);
+BENCHMARK(runningOnOrdinaryFiles)->UseManualTime()->Unit(benchmark::kSecond)->Iterations(1);
 
 /// Starts itself again in the sandbox of a virtual device, where the program finds its devices.
 void enterDevice(char** argv)
 {
     const std::string device = buildFolder() / "virtual-device/virtual-device";
     const std::string self = std::filesystem::read_symlink("/proc/self/exe");
-    std::vector<const char*> arguments{device.c_str(), "exec", "--", self.c_str()};
+    std::vector<const char*> arguments{device.c_str(), "exec", "--set", "audio.presence=missing", "--", self.c_str()};
     for (char** argument = argv + 1; *argument != nullptr; ++argument)
         arguments.push_back(*argument);
     arguments.push_back(nullptr);
