@@ -231,6 +231,36 @@ private slots:
         QVERIFY(!flag("radio.beacon"));
     }
 
+    void aCommandOfAnotherLengthIsRefused_data()
+    {
+        QTest::addColumn<int>("code");
+        QTest::addColumn<QList<int>>("lengths");
+        QTest::newRow("transmit packet") << 0x02 << QList<int>{0, 5, 38};
+        QTest::newRow("start beacon") << 0x20 << QList<int>{0, 6, 18};
+        QTest::newRow("stop beacon") << 0x21 << QList<int>{0, 2};
+        QTest::newRow("update beacon") << 0x22 << QList<int>{11, 12};
+        QTest::newRow("accelerometer mode") << 0x30 << QList<int>{0, 2};
+        QTest::newRow("start RF test") << 0x60 << QList<int>{0, 1, 3};
+        QTest::newRow("stop RF test") << 0x61 << QList<int>{1};
+        QTest::newRow("check radio") << 0x62 << QList<int>{1};
+        QTest::newRow("amplifier") << 0x64 << QList<int>{0, 2};
+        QTest::newRow("frame pulse") << 0x65 << QList<int>{1};
+        QTest::newRow("version") << 0x70 << QList<int>{1};
+        QTest::newRow("ping") << 0x7E << QList<int>{1};
+    }
+
+    void aCommandOfAnotherLengthIsRefused()
+    {
+        QFETCH(int, code);
+        QFETCH(QList<int>, lengths);
+        for (const int length : lengths) {
+            QVERIFY(tty->write(radioFrame(static_cast<char>(code) + QByteArray(length, '\x02'))));
+            QTRY_COMPARE(tty->messages(), Messages{"ff02"});
+            tty->forget();
+        }
+        QCOMPARE(number("radio.violations"), lengths.size());
+    }
+
     void nothingIsWrittenBeforeTheResetLineOrTheFirstCommand()
     {
         Registry fresh;
