@@ -46,7 +46,8 @@ public slots:
 
 signals:
     void scanComplete();
-    /// 0 to 99, while a file that is not empty is being deleted.
+    /// While a file that is not empty is being deleted: 0 at first. The end is `deleteComplete()`, not a 100, which is
+    /// only seen when the rest is too small to count as a hundredth.
     void deleteProgress(qint32 percent);
     void deleteComplete();
 };

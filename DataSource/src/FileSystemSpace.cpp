@@ -17,8 +17,10 @@ std::optional<FileSystemSpace> FileSystemSpace::of(const QString& directory)
     };
     if (::statvfs(QFile::encodeName(directory).constData(), &status) != 0)
         return std::nullopt;
-    return FileSystemSpace{static_cast<qint64>(status.f_bsize * status.f_blocks),
-                           static_cast<qint64>(status.f_bsize * status.f_bfree)};
+    // Widened first: on the device the factors have 32 bits.
+    const auto blockSize = static_cast<qint64>(status.f_bsize);
+    return FileSystemSpace{blockSize * static_cast<qint64>(status.f_blocks),
+                           blockSize * static_cast<qint64>(status.f_bfree)};
 }
 
 } // namespace DataSource

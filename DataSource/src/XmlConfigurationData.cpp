@@ -168,10 +168,12 @@ QByteArray XmlConfigurationData::PrivateData::document() const
     return content;
 }
 
-/// The system's own words ("Permission denied") rather than the save file's, for the log's readers. Opened for
-/// appending, so that nothing is lost if it can be opened after all.
+/// The system's own words ("Permission denied") rather than the save file's, which has its own for a file that is there
+/// already. Opened for appending, so that nothing is lost if it can be opened after all.
 QString XmlConfigurationData::PrivateData::reasonNotWritable(const QString& fallback)
 {
+    if (!file.exists())
+        return fallback;
     if (!file.open(QIODevice::WriteOnly | QIODevice::Append | QIODevice::ExistingOnly))
         return file.errorString();
     file.close();

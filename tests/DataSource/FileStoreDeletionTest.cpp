@@ -6,6 +6,7 @@
 
 #include <QSignalSpy>
 #include <QTest>
+#include <QThread>
 #include <QThreadPool>
 
 #include <sys/stat.h>
@@ -49,6 +50,7 @@ private slots:
     void progressOfSizes_data();
     void progressOfSizes();
     void fileIsShrunkFromItsEnd();
+    void progressComesFromThePoolAndTheEndFromTheStoresThread();
     void emptyFileReportsNoProgress();
     void countAndBytesDropAtOnce();
     void deletionBeforeTheFirstScanLeavesTheCountAtZero();
@@ -147,6 +149,29 @@ void FileStoreDeletionTest::fileIsShrunkFromItsEnd()
         [&](qint32) { sizes.append(QFileInfo(path("large")).size()); }, Qt::DirectConnection);
     remove(store, "large");
     QCOMPARE(sizes, (QList<qint64>{25 * mebibyte, 15 * mebibyte, 5 * mebibyte}));
+}
+
+void FileStoreDeletionTest::progressComesFromThePoolAndTheEndFromTheStoresThread()
+{
+    makeFile("small", 1);
+    FileStore store(directory());
+    QThread* progressThread = nullptr;
+    QThread* endThread = nullptr;
+    bool wasDeleting = true;
+    connect(
+        &store, &AbstractFileStore::deleteProgress, this, [&](qint32) { progressThread = QThread::currentThread(); },
+        Qt::DirectConnection);
+    connect(
+        &store, &AbstractFileStore::deleteComplete, this,
+        [&] {
+            endThread = QThread::currentThread();
+            wasDeleting = store.isDeleting();
+        },
+        Qt::DirectConnection);
+    remove(store, "small");
+    QVERIFY(progressThread != nullptr && progressThread != store.thread());
+    QCOMPARE(endThread, store.thread());
+    QVERIFY(!wasDeleting);
 }
 
 void FileStoreDeletionTest::emptyFileReportsNoProgress()

@@ -7,11 +7,14 @@
 
 #include <QSignalSpy>
 #include <QTest>
+#include <QThread>
 #include <QThreadPool>
 
 #include <sys/stat.h>
 #include <sys/statvfs.h>
 #include <unistd.h>
+
+#include <optional>
 
 using DataSource::AbstractFileStore;
 using DataSource::FileStore;
@@ -41,6 +44,7 @@ private slots:
     void newStoreOnAMissingDirectoryCreatesIt();
     void directoriesOfEverySizeAreCounted_data();
     void directoriesOfEverySizeAreCounted();
+    void scanEndsInTheThreadOfTheStore();
     void everyFileBelowTheCountIsFound_data();
     void everyFileBelowTheCountIsFound();
     void onlyVisibleFilesCount();
@@ -57,6 +61,7 @@ private slots:
     void stopWithoutAScanDoesNothing();
     void createFileNamesAFileAndCreatesNothing();
     void spaceIsTheFileSystems();
+    void spaceIsCountedInBlocksWithTheSuperusersReserve();
     void vanishedDirectoryHasNoSpaceAndNoWarning();
     void refusedSpaceIsLogged();
     void unreadableDirectoryIsEmpty();
@@ -66,6 +71,8 @@ private slots:
 
 /// While it is above 0, `statvfs` fails: a file system on a dying card.
 static int failingSpaceCalls = 0;
+/// What `statvfs` answers instead of the truth.
+static std::optional<struct statvfs> claimedSpace;
 
 extern "C" int statvfs(const char* path, struct statvfs* status) noexcept
 {
@@ -76,7 +83,10 @@ extern "C" int statvfs(const char* path, struct statvfs* status) noexcept
         errno = EIO;
         return -1;
     }
-    return real(path, status);
+    const int result = real(path, status);
+    if (claimedSpace)
+        *status = *claimedSpace;
+    return result;
 }
 
 void FileStoreTest::signalsAndSlotsAreDeclared()
@@ -121,6 +131,24 @@ void FileStoreTest::directoriesOfEverySizeAreCounted()
     QCOMPARE(store.count(), files);
     QCOMPARE(store.bytesUsed(), 3LL * files);
     QVERIFY(!store.isScanning());
+}
+
+void FileStoreTest::scanEndsInTheThreadOfTheStore()
+{
+    makeFiles(3, 1);
+    FileStore store(directory());
+    QThread* thread = nullptr;
+    bool wasScanning = true;
+    connect(
+        &store, &AbstractFileStore::scanComplete, this,
+        [&] {
+            thread = QThread::currentThread();
+            wasScanning = store.isScanning();
+        },
+        Qt::DirectConnection);
+    scan(store);
+    QCOMPARE(thread, store.thread());
+    QVERIFY(!wasScanning);
 }
 
 void FileStoreTest::everyFileBelowTheCountIsFound_data()
@@ -268,7 +296,6 @@ void FileStoreTest::stoppedScanStoresWhatItHasCounted()
     int counted = 0;
     for (int attempt = 0; attempt < 2000 && (counted == 0 || counted == files); ++attempt) {
         store.rescan();
-        QTest::qSleep(0);
         ::usleep(static_cast<useconds_t>(attempt * 20));
         store.stopScanning();
         settle();
@@ -352,6 +379,25 @@ void FileStoreTest::spaceIsTheFileSystems()
     QCOMPARE(file.write(QByteArray(1 << 20, 'x')), 1 << 20);
     file.close();
     QVERIFY(before - store.bytesFree() >= 1 << 20);
+}
+
+void FileStoreTest::spaceIsCountedInBlocksWithTheSuperusersReserve()
+{
+    const FileStore store(directory());
+    struct statvfs card
+    {
+    };
+    card.f_bsize = 4096;
+    card.f_frsize = 512;
+    card.f_blocks = 3'000'000'000;
+    card.f_bfree = 2'000'000'000;
+    card.f_bavail = 1'000'000'000;
+    claimedSpace = card;
+    const qint64 capacity = store.bytesCapacity();
+    const qint64 free = store.bytesFree();
+    claimedSpace.reset();
+    QCOMPARE(capacity, 12'288'000'000'000);
+    QCOMPARE(free, 8'192'000'000'000);
 }
 
 void FileStoreTest::vanishedDirectoryHasNoSpaceAndNoWarning()

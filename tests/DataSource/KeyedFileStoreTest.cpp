@@ -9,6 +9,8 @@
 
 #include <sys/statvfs.h>
 
+#include <optional>
+
 using DataSource::KeyedFileStore;
 using TestSupport::FileStoreFixture;
 using TestSupport::loggedTexts;
@@ -31,6 +33,7 @@ private slots:
     void onlyVisibleFilesOfTheDirectoryItselfAreUsed();
     void largeFilesAreSummedIn64Bits();
     void spaceIsTheFileSystems();
+    void spaceIsCountedInBlocksWithTheSuperusersReserve();
     void vanishedDirectoryIsEmptyAndLogsNothing();
     void refusedSpaceIsLogged();
     void fileInPlaceOfTheDirectory();
@@ -38,6 +41,8 @@ private slots:
 
 /// While it is above 0, `statvfs` fails: a file system on a dying card.
 static int failingSpaceCalls = 0;
+/// What `statvfs` answers instead of the truth.
+static std::optional<struct statvfs> claimedSpace;
 
 extern "C" int statvfs(const char* path, struct statvfs* status) noexcept
 {
@@ -48,7 +53,10 @@ extern "C" int statvfs(const char* path, struct statvfs* status) noexcept
         errno = EIO;
         return -1;
     }
-    return real(path, status);
+    const int result = real(path, status);
+    if (claimedSpace)
+        *status = *claimedSpace;
+    return result;
 }
 
 void KeyedFileStoreTest::storeOnAMissingDirectoryCreatesIt()
@@ -175,6 +183,25 @@ void KeyedFileStoreTest::spaceIsTheFileSystems()
     QCOMPARE(file.write(QByteArray(1 << 20, 'x')), 1 << 20);
     file.close();
     QVERIFY(before - store.bytesFree() >= 1 << 20);
+}
+
+void KeyedFileStoreTest::spaceIsCountedInBlocksWithTheSuperusersReserve()
+{
+    const KeyedFileStore store(directory());
+    struct statvfs card
+    {
+    };
+    card.f_bsize = 4096;
+    card.f_frsize = 512;
+    card.f_blocks = 3'000'000'000;
+    card.f_bfree = 2'000'000'000;
+    card.f_bavail = 1'000'000'000;
+    claimedSpace = card;
+    const qint64 capacity = store.bytesCapacity();
+    const qint64 free = store.bytesFree();
+    claimedSpace.reset();
+    QCOMPARE(capacity, 12'288'000'000'000);
+    QCOMPARE(free, 8'192'000'000'000);
 }
 
 void KeyedFileStoreTest::vanishedDirectoryIsEmptyAndLogsNothing()

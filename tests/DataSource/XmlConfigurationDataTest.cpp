@@ -109,6 +109,7 @@ private slots:
     void irregularFiles();
     void elementNameBeyondAsciiIsLoggedAsItIs();
     void missingDirectoryKeepsTheValueInMemory();
+    void missingFileInAnUnwritableDirectoryIsLogged();
     void unwritableDirectoryOfAWritableFileIsWrittenInPlace();
     void directoryInPlaceOfTheFileIsLoggedBothWays();
     void readOnlyFileKeepsItsOldContent();
@@ -383,6 +384,17 @@ void XmlConfigurationDataTest::missingDirectoryKeepsTheValueInMemory()
     QCOMPARE(loggedTexts(*log),
              (QStringList{warning(60, "Unable to open configuration file"),
                           warning(107, "Unable to open XML file for writing: No such file or directory")}));
+}
+
+void XmlConfigurationDataTest::missingFileInAnUnwritableDirectoryIsLogged()
+{
+    XmlConfigurationData configuration(path());
+    loggedTexts(*log);
+    QVERIFY(QFile::setPermissions(directory->path(), QFile::ReadOwner | QFile::ExeOwner));
+    configuration.setData(Key::Volume, 6);
+    QCOMPARE(loggedTexts(*log), QStringList{warning(107, "Unable to open XML file for writing: Permission denied")});
+    QCOMPARE(configuration.data(Key::Volume), QVariant(6));
+    QVERIFY(!QFile::exists(path()));
 }
 
 void XmlConfigurationDataTest::unwritableDirectoryOfAWritableFileIsWrittenInPlace()
