@@ -48,6 +48,10 @@ std::atomic<bool> loadsAreSlow = false;
 std::counting_semaphore<> slowLoads(0);
 std::atomic<int> waitingLoads = 0;
 std::atomic<bool> initialisationFails = false;
+/// What the latest audio object has asked SDL for.
+Uint32 initialisedSubsystems = 0;
+SDL_AudioSpec openedSpec{};
+bool obtainedSpecWanted = true;
 
 } // namespace
 
@@ -75,7 +79,17 @@ extern "C" void SDL_PauseAudio(int isPaused)
 extern "C" int SDL_Init(Uint32 subsystems)
 {
     static const auto real = reinterpret_cast<int (*)(Uint32)>(::dlsym(RTLD_NEXT, "SDL_Init"));
+    initialisedSubsystems = subsystems;
     return initialisationFails ? -1 : real(subsystems);
+}
+
+extern "C" int SDL_OpenAudio(SDL_AudioSpec* desired, SDL_AudioSpec* obtained)
+{
+    using Function = int (*)(SDL_AudioSpec*, SDL_AudioSpec*);
+    static const auto real = reinterpret_cast<Function>(::dlsym(RTLD_NEXT, "SDL_OpenAudio"));
+    openedSpec = *desired;
+    obtainedSpecWanted = obtained != nullptr;
+    return real(desired, obtained);
 }
 
 /// What is heard is what SDL's disk driver has written.
@@ -88,6 +102,7 @@ private slots:
     void cleanup();
 
     void signalsAndSlotsAreDeclared();
+    void deviceIsOpenedForSixteenKilohertzMonoAndPaused();
     void feedHandsOverEveryByteAndThenPauses();
     void feedLeavesTheRestOfAShortChunkAlone();
     void soundsOfEverySizeAreHeardByteForByte_data();
@@ -118,6 +133,8 @@ private slots:
     void requestsDuringASlowLoadAreAnsweredByIt();
     void requestsForDifferentSoundsAreAllLoaded();
     void failedLoadAnswersNothing();
+    void stopDuringALoadLeavesNothingToPlay();
+    void playAfterAStopDuringALoadIsHeard();
     void fileDeletedBeforeItsTurnIsUnreadable();
     void stopsAndPlaysFromTwoThreadsWithoutADevice();
     void withoutADeviceNothingPlays();
@@ -131,10 +148,11 @@ private:
     QFile* wave(const QByteArray& samples, const QString& name = "sound.wav");
     void restart();
     void waitForTheEnd() const { QTRY_VERIFY_WITH_TIMEOUT(!audio->isPlaying(), 20000); }
-    void waitForTheStart() const { QTRY_VERIFY_WITH_TIMEOUT(audio->isPlaying(), 20000); }
     void playToTheEnd(QIODevice* sound);
     /// Waits until the audio's thread has worked off what was asked of it so far.
     void flush() const;
+    /// Not by asking the device again and again: a short sound might end between two questions.
+    void waitForTheStart() const { flush(); }
 
     std::unique_ptr<SoundFixture> sound;
     std::unique_ptr<LogCapture> log;
@@ -199,6 +217,21 @@ void AudioPlaybackTest::signalsAndSlotsAreDeclared()
     QVERIFY(AbstractAudio::staticMetaObject.indexOfSignal("complete()") >= 0);
 }
 
+void AudioPlaybackTest::deviceIsOpenedForSixteenKilohertzMonoAndPaused()
+{
+    QCOMPARE(initialisedSubsystems & ~SDL_INIT_NOPARACHUTE, SDL_INIT_AUDIO);
+    QCOMPARE(openedSpec.freq, 16000);
+    QCOMPARE(openedSpec.format, AUDIO_S16LSB);
+    QCOMPARE(int(openedSpec.channels), 1);
+    QCOMPARE(int(openedSpec.samples), 4096);
+    QVERIFY(openedSpec.callback == Domain::audioFeed);
+    // SDL converts to what the hardware can do.
+    QVERIFY(!obtainedSpecWanted);
+    QVERIFY(!audio->isPlaying());
+    QVERIFY(audio->thread()->isRunning());
+    QCOMPARE(audio->thread()->priority(), QThread::InheritPriority);
+}
+
 void AudioPlaybackTest::feedHandsOverEveryByteAndThenPauses()
 {
     const QByteArray samples = noise(100, 1);
@@ -252,9 +285,10 @@ void AudioPlaybackTest::soundsOfEverySizeAreHeardByteForByte()
 
 void AudioPlaybackTest::playingEndsAfterTheLastByte()
 {
-    const QByteArray samples = noise(20 * SoundFixture::bufferSize, 7);
+    const QByteArray samples = noise(200 * SoundFixture::bufferSize, 7);
     audio->play(wave(samples));
     waitForTheStart();
+    QVERIFY(audio->isPlaying());
     // The driver has written a buffer before the device can be asked: all of them must be there once it says no.
     waitForTheEnd();
     audio.reset();
@@ -352,7 +386,7 @@ void AudioPlaybackTest::stopEmitsNothing()
 
 void AudioPlaybackTest::pauseAndResumeLoseNothing()
 {
-    const QByteArray samples = noise(100 * SoundFixture::bufferSize, 1);
+    const QByteArray samples = noise(400 * SoundFixture::bufferSize, 1);
     audio->play(wave(samples));
     QTRY_VERIFY_WITH_TIMEOUT(!sound->sounds().isEmpty(), 20000);
     audio->pause();
@@ -566,6 +600,39 @@ void AudioPlaybackTest::failedLoadAnswersNothing()
     slowLoads.release();
     flush();
     QCOMPARE(loggedTexts(*log), QStringList(2, unloadable(file.fileName())));
+}
+
+void AudioPlaybackTest::stopDuringALoadLeavesNothingToPlay()
+{
+    loadsAreSlow = true;
+    audio->play(wave(noise(4000 * SoundFixture::bufferSize, 1)));
+    QTRY_COMPARE(waitingLoads.load(), 1);
+    audio->stop();
+    loadsAreSlow = false;
+    slowLoads.release();
+    flush();
+    QVERIFY(!audio->isPlaying());
+    audio.reset();
+    QCOMPARE(sound->sounds().size(), 0);
+    QCOMPARE(loggedTexts(*log), QStringList());
+}
+
+void AudioPlaybackTest::playAfterAStopDuringALoadIsHeard()
+{
+    loadsAreSlow = true;
+    const QByteArray samples = noise(3 * SoundFixture::bufferSize, 1);
+    QFile* const file = wave(samples);
+    audio->play(file);
+    QTRY_COMPARE(waitingLoads.load(), 1);
+    audio->stop();
+    audio->play(file);
+    loadsAreSlow = false;
+    slowLoads.release();
+    flush();
+    waitForTheEnd();
+    QCOMPARE(loads.load(), 2);
+    audio.reset();
+    QCOMPARE(sound->sounds(), QList<QByteArray>{samples});
 }
 
 void AudioPlaybackTest::fileDeletedBeforeItsTurnIsUnreadable()

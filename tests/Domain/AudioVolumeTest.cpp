@@ -25,6 +25,10 @@ namespace
 
 int callsWithoutHandle = 0;
 int loads = 0;
+int closes = 0;
+int writes = 0;
+bool loadFails = false;
+bool hasNoControls = false;
 
 QString tooLow(int volume)
 {
@@ -45,7 +49,29 @@ extern "C" int snd_hctl_load(snd_hctl_t* control)
     ++loads;
     if (control == nullptr)
         ++callsWithoutHandle;
-    return control == nullptr ? -EINVAL : real(control);
+    return control == nullptr || loadFails ? -EINVAL : real(control);
+}
+
+extern "C" snd_hctl_elem_t* snd_hctl_last_elem(snd_hctl_t* control)
+{
+    using Function = snd_hctl_elem_t* (*)(snd_hctl_t*);
+    static const auto real = reinterpret_cast<Function>(::dlsym(RTLD_NEXT, "snd_hctl_last_elem"));
+    return hasNoControls ? nullptr : real(control);
+}
+
+extern "C" int snd_hctl_elem_write(snd_hctl_elem_t* control, snd_ctl_elem_value_t* value)
+{
+    using Function = int (*)(snd_hctl_elem_t*, snd_ctl_elem_value_t*);
+    static const auto real = reinterpret_cast<Function>(::dlsym(RTLD_NEXT, "snd_hctl_elem_write"));
+    ++writes;
+    return real(control, value);
+}
+
+extern "C" int snd_hctl_close(snd_hctl_t* control)
+{
+    static const auto real = reinterpret_cast<int (*)(snd_hctl_t*)>(::dlsym(RTLD_NEXT, "snd_hctl_close"));
+    ++closes;
+    return real(control);
 }
 
 /// What is written is what the sound card's state file says.
@@ -71,6 +97,9 @@ private slots:
     void volumeStoresTheDefaultWhenThereIsNone();
     void withoutACardNothingMoreIsCalled();
     void cardThatRefusesToOpenIsLeftAlone();
+    void everyUseOfTheCardEndsWithItsClose();
+    void cardThatDoesNotLoadIsClosedAndNotWritten();
+    void cardWithoutControlsIsClosedAndNotWritten();
 
 private:
     [[nodiscard]] QByteArray configurationFile() const;
@@ -86,6 +115,10 @@ void AudioVolumeTest::init()
 {
     // The library keeps the configuration that it has read; every case has its own.
     snd_config_update_free_global();
+    closes = 0;
+    writes = 0;
+    loadFails = false;
+    hasNoControls = false;
     sound = std::make_unique<SoundFixture>();
     log = std::make_unique<LogCapture>();
     configuration = std::make_unique<XmlConfigurationData>(sound->path("configuration"));
@@ -266,6 +299,35 @@ void AudioVolumeTest::cardThatRefusesToOpenIsLeftAlone()
     loads = 0;
     audio = std::make_unique<Audio>(*configuration);
     QCOMPARE(loads, 0);
+}
+
+void AudioVolumeTest::everyUseOfTheCardEndsWithItsClose()
+{
+    QCOMPARE(closes, 1);
+    audio->setVolume(4);
+    audio->setVolume(9);
+    QCOMPARE(closes, 3);
+    QCOMPARE(writes, 3);
+}
+
+void AudioVolumeTest::cardThatDoesNotLoadIsClosedAndNotWritten()
+{
+    loadFails = true;
+    audio->setVolume(4);
+    QCOMPARE(closes, 2);
+    QCOMPARE(writes, 1);
+    QCOMPARE(audio->volume(), 4);
+    QCOMPARE(loggedTexts(*log), QStringList());
+}
+
+void AudioVolumeTest::cardWithoutControlsIsClosedAndNotWritten()
+{
+    hasNoControls = true;
+    audio->setVolume(4);
+    QCOMPARE(closes, 2);
+    QCOMPARE(writes, 1);
+    QCOMPARE(audio->volume(), 4);
+    QCOMPARE(loggedTexts(*log), QStringList());
 }
 
 QTEST_GUILESS_MAIN(AudioVolumeTest)

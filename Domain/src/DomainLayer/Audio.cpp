@@ -18,6 +18,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 #include <cstdio>
 #include <mutex>
 
@@ -117,6 +118,7 @@ public:
     void openDevice();
     void setDeviceVolume(int volume) const;
     void setSound(const LoadedSound& sound);
+    void startSound(const LoadedSound& sound, const QIODevice* device, unsigned int stopsBefore);
 
     AbstractConfigurationData& configuration;
     bool initialised = false;
@@ -125,6 +127,8 @@ public:
     AudioFeed feed;
     /// Held by all who change the sound, outside the callback lock, which guards nothing while no device is open.
     std::mutex mutex;
+    /// How often the sound has been stopped; raised under the mutex.
+    std::atomic<unsigned int> stops = 0;
     PlayRequests requests;
     QThread thread;
 };
@@ -174,6 +178,21 @@ void Audio::PrivateData::setSound(const LoadedSound& sound)
     SDL_FreeWAV(previous);
 }
 
+/// Unless it has been stopped while it was being loaded.
+void Audio::PrivateData::startSound(const LoadedSound& sound, const QIODevice* device, unsigned int stopsBefore)
+{
+    const std::lock_guard lock(mutex);
+    if (stops != stopsBefore) {
+        SDL_FreeWAV(sound.buffer);
+        return;
+    }
+    setSound(sound);
+    spec = sound.spec;
+    SDL_PauseAudio(0);
+    // Still under the mutex: what is asked for after the next stop is not answered by this start.
+    requests.answer(device);
+}
+
 Audio::Audio(AbstractConfigurationData& configuration) : d(std::make_unique<PrivateData>(configuration))
 {
     d->openDevice();
@@ -215,17 +234,13 @@ void Audio::playAudio(QIODevice* sound)
     stop();
     const QString fileName = file->fileName();
     // Outside the locks: a slow card must not hold up whoever pauses or stops meanwhile.
+    const unsigned int stopsBefore = d->stops;
     const LoadedSound loaded = loadedSound(fileName);
-    const std::lock_guard lock(d->mutex);
-    d->setSound(loaded);
-    if (loaded.buffer == nullptr) {
+    if (loaded.buffer == nullptr)
         warn(unloadableSoundLine,
              QStringLiteral("Unable to open sound file %1").arg(Utilities::Debug::literal(fileName)));
-        return;
-    }
-    d->spec = loaded.spec;
-    SDL_PauseAudio(0);
-    d->requests.answer(sound);
+    else
+        d->startSound(loaded, sound, stopsBefore);
 }
 
 void Audio::pause()
@@ -241,6 +256,7 @@ void Audio::resume()
 void Audio::stop()
 {
     const std::lock_guard lock(d->mutex);
+    ++d->stops;
     SDL_PauseAudio(1);
     d->setSound({});
 }
