@@ -71,6 +71,7 @@ private slots:
     void powerCountsAnewAfterAFreshPress();
     void freshPowerPressResetsTheCountWhileSignalsAreDisabled();
     void unknownKeyIsLoggedOnce();
+    void keyEventsGoNoFurther();
     void releasesAreNotHandled();
     void disabledIndividualSignalsLeaveAnyButtonOnly();
     void theLockDoesNotSilenceKeys();
@@ -253,6 +254,15 @@ void ButtonsTest::unknownKeyIsLoggedOnce()
     repeat(Qt::Key_A);
     QCOMPARE(recorder->take(), QStringList{"any"});
     QCOMPARE(loggedTexts(*log), QStringList());
+}
+
+void ButtonsTest::keyEventsGoNoFurther()
+{
+    for (const int key : {int(Qt::Key_Return), int(Qt::Key_F12), int(Qt::Key_A)}) {
+        QKeyEvent event(QEvent::KeyPress, key, Qt::NoModifier);
+        QCoreApplication::sendEvent(QWidget::keyboardGrabber(), &event);
+        QVERIFY(event.isAccepted());
+    }
 }
 
 void ButtonsTest::releasesAreNotHandled()

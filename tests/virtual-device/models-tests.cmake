@@ -10,6 +10,7 @@ immunityrig_test(DspModelTest SOURCES virtual-device/DspModelTest.cpp LIBRARIES 
 immunityrig_test(DspEventsTest SOURCES virtual-device/DspEventsTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(SoundMatcherTest SOURCES virtual-device/SoundMatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(AudioWatcherTest SOURCES virtual-device/AudioWatcherTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(MixerPluginTest SOURCES virtual-device/MixerPluginTest.cpp LIBRARIES VirtualDevice SoundFixture LABELS unit)
 
 # The program's classes against the device's models: two sides that share no code.
 immunityrig_test(RadioCrossCheckTest SOURCES virtual-device/RadioCrossCheckTest.cpp LIBRARIES Domain VirtualDevice
