@@ -153,6 +153,11 @@ void FileStoreCacheTest::positionNearTheStartFillsTheCacheAnew()
     QVERIFY(!isCached(store, 12)); // just before: filled from the start
     for (int index = 0; index < 30; ++index)
         QVERIFY2(isCached(store, index), qPrintable(QString::number(index)));
+    QVERIFY(!isCached(store, 40)); // far: 40 alone
+    QVERIFY(!isCached(store, 14)); // far: 14 alone
+    QVERIFY(!isCached(store, 13)); // just before: the last position for which it is filled from the start
+    for (int index = 0; index < 30; ++index)
+        QVERIFY2(isCached(store, index), qPrintable(QString::number(index)));
     QVERIFY(!isCached(store, 32)); // far: 32 alone
     QVERIFY(!isCached(store, 15)); // far: 15 alone
     QVERIFY(!isCached(store, 14)); // just before: 0 to 14 in front of it

@@ -112,6 +112,7 @@ private slots:
     void playOnlyEmitsAudioSet();
     void loadingHappensOnTheAudioThread();
     void sameSoundAgainStartsFromItsBeginning();
+    void openFileIsRewound();
     void secondSoundReplacesTheFirst();
     void stopCutsTheSound();
     void stopEmitsNothing();
@@ -341,6 +342,14 @@ void AudioPlaybackTest::sameSoundAgainStartsFromItsBeginning()
     playToTheEnd(file);
     audio.reset();
     QCOMPARE(sound->sounds().join(), samples + samples);
+}
+
+void AudioPlaybackTest::openFileIsRewound()
+{
+    QFile* const file = wave(noise(100, 1));
+    QVERIFY(file->seek(60));
+    playToTheEnd(file);
+    QCOMPARE(file->pos(), 0);
 }
 
 void AudioPlaybackTest::secondSoundReplacesTheFirst()
