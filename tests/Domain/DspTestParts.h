@@ -17,9 +17,11 @@ namespace TestSupport
 {
 
 /// What was logged since the last call; "Domain/src/DomainLayer/X.cpp, LINE, TEXT" shortened to "X: TEXT".
+/// Fatal lines are not told from warnings.
 inline QStringList sourcedTexts(LogCapture& log)
 {
-    static const QRegularExpression prefix(QStringLiteral(R"(^Domain/src/DomainLayer/(\w+)\.cpp, \d+, )"));
+    static const QRegularExpression prefix(
+        QStringLiteral(R"(^(?:\(priority 0\) )?Domain/src/DomainLayer/(\w+)\.cpp, \d+, )"));
     QStringList texts = loggedTexts(log);
     for (QString& text : texts)
         text.replace(prefix, QStringLiteral("\\1: "));
