@@ -138,6 +138,8 @@ BENCHMARK(memory)->Arg(100)->Arg(manyFiles)->Unit(benchmark::kMillisecond)->Iter
 
 int main(int argc, char* argv[])
 {
+    // One heap for all threads, so that "heap" also sees what the pool's threads keep.
+    ::mallopt(M_ARENA_MAX, 1);
     const QCoreApplication application(argc, argv);
     benchmark::Initialize(&argc, argv);
     benchmark::RunSpecifiedBenchmarks();
