@@ -97,6 +97,10 @@ TestGui::PrivateData::PrivateData(TestGui& testGui, DataSource::AbstractDataSour
 TestGui::PrivateData::~PrivateData()
 {
     audioTest.stop();
+    // A window that hides delivers the key events that still wait. They must find everything alive, and nothing may
+    // act on them any more.
+    QObject::disconnect(&buttonsTest, nullptr, nullptr, nullptr);
+    screen.hide();
 }
 
 void TestGui::PrivateData::startTests()
