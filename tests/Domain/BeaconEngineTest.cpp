@@ -504,11 +504,11 @@ void BeaconEngineTest::theFirstCommandIsWrittenByItsCallerAndTheQueuedOneByTheWo
 
 void BeaconEngineTest::repliesAreToldOnAWorkerThreadOfHighPriority()
 {
+    std::atomic<QThread*> teller = nullptr;
     Radio radio;
     QThread* const worker = radio.processor.thread();
     QVERIFY(worker != QThread::currentThread());
     QCOMPARE(worker->priority(), QThread::HighPriority);
-    std::atomic<QThread*> teller = nullptr;
     connect(
         &radio.processor, &BeaconProcessor::pingResponse, this, [&] { teller = QThread::currentThread(); },
         Qt::DirectConnection);
