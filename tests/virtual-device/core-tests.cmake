@@ -14,6 +14,7 @@ function(immunityrig_device_test NAME)
     get_test_property(${NAME} ${property} value)
     set_tests_properties(${NAME}AsOrdinaryUser PROPERTIES ${property} "${value}")
   endforeach()
+  set_tests_properties(${NAME}AsOrdinaryUser PROPERTIES SKIP_RETURN_CODE 77)
 endfunction()
 
 immunityrig_device_test(DeviceFolderTest)
