@@ -5,6 +5,7 @@
 
 #include "Domain/src/DomainLayer/AbstractBeaconProcessor.h"
 #include "Domain/src/DomainLayer/AbstractDsp.h"
+#include "presentation/TerminationSignals.h"
 #include "presentation/WidgetUpdates.h"
 #include "presentation/ui_RfTest.h"
 
@@ -90,6 +91,13 @@ struct RfTest::PrivateData
     {
         send(command, arguments...);
         wait();
+    }
+
+    /// The DSP's commands wait, too, up to 0.8 s each. A program that is to end gives none.
+    void send(bool (Domain::AbstractDsp::*command)(qint32), qint32 argument)
+    {
+        if (!TerminationSignals::isEndRequested())
+            (dsp.*command)(argument);
     }
 
     void wait();
@@ -194,18 +202,18 @@ void RfTest::toggleExternalAntenna()
 {
     d->externalAntenna = !d->externalAntenna;
     d->ui.labelRadios->setText(d->externalAntenna ? QStringLiteral("External RF") : QStringLiteral("Internal RF"));
-    d->dsp.runHardwareTest(0);
+    d->send(&Domain::AbstractDsp::runHardwareTest, 0);
     if (d->transmitting) {
         d->stopPacket();
         d->sendAndWait(&AbstractBeaconProcessor::setPowerAmpEnable, false);
     }
-    d->dsp.setReceiverEnableTest(0);
-    d->dsp.setReceiverEnableTest(d->externalAntenna ? 2 : 1);
+    d->send(&Domain::AbstractDsp::setReceiverEnableTest, 0);
+    d->send(&Domain::AbstractDsp::setReceiverEnableTest, d->externalAntenna ? 2 : 1);
     if (d->transmitting) {
         d->startPacket();
         d->sendAndWait(&AbstractBeaconProcessor::setPowerAmpEnable, true);
     }
-    d->dsp.runHardwareTest(1);
+    d->send(&Domain::AbstractDsp::runHardwareTest, 1);
 }
 
 void RfTest::communicationFail()
@@ -248,7 +256,8 @@ void RfTest::radioTimeout()
 
 void RfTest::PrivateData::wait()
 {
-    while (beaconProcessor.isCommandPending()) {
+    // A silent microcontroller takes 3 s a command; a program that is to end has no more than that altogether.
+    while (!TerminationSignals::isEndRequested() && beaconProcessor.isCommandPending()) {
         if (waitLimit.hasExpired()) {
             showBeacon(failStyleSheet);
             return;

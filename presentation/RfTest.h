@@ -26,7 +26,8 @@ namespace Presentation
 ///
 /// A command that the link refuses is not waited for, and none after it: the link counts as dead ("Beacon Micro" red)
 /// until no command is pending any more. A ping reply lets the panel wait again, but for 4 seconds at most until the
-/// pending command has been seen done: after a refused command it may never be.
+/// pending command has been seen done: after a refused command it may never be. Nothing is waited for, and the DSP is
+/// asked for nothing, once the program is to end (TerminationSignals).
 class RfTest : public QWidget
 {
     Q_OBJECT

@@ -19,7 +19,9 @@ namespace
 {
 
 std::atomic<int> pipeInput{-1};
-static_assert(std::atomic<int>::is_always_lock_free, "the signal handler reads it");
+std::atomic<bool> endRequested{false};
+static_assert(std::atomic<int>::is_always_lock_free && std::atomic<bool>::is_always_lock_free,
+              "the signal handler uses them");
 
 void setAction(void (*handler)(int))
 {
@@ -38,6 +40,7 @@ void requestEnd(int /*signal*/)
 {
     const int savedErrno = errno;
     setAction(SIG_DFL);
+    endRequested = true;
     const char byte = 1;
     [[maybe_unused]] const auto written = ::write(pipeInput.load(), &byte, 1);
     errno = savedErrno;
@@ -57,8 +60,13 @@ TerminationSignals::Pipe::~Pipe()
     ::close(ends[1]);
 }
 
-TerminationSignals::TerminationSignals() : notifier(pipe.ends[0], QSocketNotifier::Read)
+TerminationSignals::TerminationSignals() : notifier(QSocketNotifier::Read)
 {
+    endRequested = false;
+    if (pipe.ends[0] < 0)
+        return;
+    notifier.setSocket(pipe.ends[0]);
+    notifier.setEnabled(true);
     connect(&notifier, &QSocketNotifier::activated, this, [this] {
         notifier.setEnabled(false);
         QCoreApplication::quit();
@@ -71,6 +79,11 @@ TerminationSignals::~TerminationSignals()
 {
     setAction(SIG_DFL);
     pipeInput = -1;
+}
+
+bool TerminationSignals::isEndRequested()
+{
+    return endRequested;
 }
 
 } // namespace Presentation
