@@ -12,6 +12,8 @@ target_include_directories(ProjectOptions INTERFACE "${PROJECT_SOURCE_DIR}")
 target_compile_options(ProjectOptions INTERFACE
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion
   $<$<BOOL:${IMMUNITYRIG_WERROR}>:-Werror>
+  # Here, not by a library's own options: one precompiled header serves only what is compiled alike.
+  -pthread
   # The log names a source file by its path from the project's root, whatever the build folder is.
   "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
 target_compile_definitions(ProjectOptions INTERFACE

@@ -139,7 +139,7 @@ FileStore::FileStore(const QString& path) : d(std::make_unique<PrivateData>(this
 
 FileStore::~FileStore()
 {
-    stopScanning();
+    FileStore::stopScanning();
     d->contents->releaseOwner();
 }
 

@@ -73,8 +73,6 @@ private:
 
     Link() = default;
     ~Link() override;
-    Link(const Link&) = delete;
-    Link& operator=(const Link&) = delete;
 
     void messageArrived(std::uint32_t queue, ByteView message) override;
     void messageSent(const void* buffer) override;

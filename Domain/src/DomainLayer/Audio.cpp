@@ -198,7 +198,7 @@ Audio::Audio(AbstractConfigurationData& configuration) : d(std::make_unique<Priv
     d->openDevice();
     moveToThread(&d->thread);
     d->thread.start();
-    d->setDeviceVolume(volume());
+    d->setDeviceVolume(Audio::volume());
     connect(this, &Audio::audioSet, this, &Audio::playAudio);
 }
 
