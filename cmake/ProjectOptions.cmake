@@ -6,6 +6,8 @@ set(CMAKE_CXX_STANDARD_REQUIRED ON)
 set(CMAKE_CXX_EXTENSIONS OFF)
 set(CMAKE_POSITION_INDEPENDENT_CODE ON)
 
+file(RELATIVE_PATH path_to_root "${CMAKE_BINARY_DIR}" "${PROJECT_SOURCE_DIR}")
+
 # What every target of the project is compiled with. Link it PRIVATE, or PUBLIC from a library of ours.
 add_library(ProjectOptions INTERFACE)
 target_include_directories(ProjectOptions INTERFACE "${PROJECT_SOURCE_DIR}")
@@ -14,8 +16,10 @@ target_compile_options(ProjectOptions INTERFACE
   $<$<BOOL:${IMMUNITYRIG_WERROR}>:-Werror>
   # Here, not by a library's own options: one precompiled header serves only what is compiled alike.
   -pthread
-  # The log names a source file by its path from the project's root, whatever the build folder is.
-  "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
+  # The log names a source file by its path from the project's root, whatever the build folder is. A compiler cache may
+  # make the path relative to that folder.
+  "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/="
+  "-fmacro-prefix-map=${path_to_root}=")
 target_compile_definitions(ProjectOptions INTERFACE
   QT_NO_FOREACH
   IMMUNITYRIG_VERSION="${PROJECT_VERSION}")

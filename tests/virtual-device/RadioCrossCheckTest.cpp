@@ -5,13 +5,13 @@
 #include "Domain/src/DomainLayer/BeaconProcessor.h"
 #include "Domain/src/DomainLayer/SerialPort.h"
 #include "tests/support/LogCapture.h"
+#include "tests/support/QueuedSpy.h"
 #include "tests/virtual-device/ModelThread.h"
 #include "virtual-device/radio/RadioModel.h"
 #include "virtual-device/registry/Registry.h"
 
 #include <QDir>
 #include <QFile>
-#include <QSignalSpy>
 #include <QTest>
 
 using namespace VirtualDevice;
@@ -85,7 +85,7 @@ private slots:
 
     void pingsAreAnswered()
     {
-        const QSignalSpy answers(beacon.get(), &BeaconProcessor::pingResponse);
+        const TestSupport::QueuedSpy answers(beacon.get(), &BeaconProcessor::pingResponse);
         for (int count = 1; count <= 20; ++count) {
             finished(beacon->sendPing());
             QTRY_COMPARE(answers.size(), count);
@@ -124,7 +124,7 @@ private slots:
         QCOMPARE(number("radio.accel_mode"), 3);
         finished(beacon->toggleFramePulseLine());
         QCOMPARE(number("radio.frame_pulses"), 1);
-        const QSignalSpy complete(beacon.get(), &BeaconProcessor::transmitPacketComplete);
+        const TestSupport::QueuedSpy complete(beacon.get(), &BeaconProcessor::transmitPacketComplete);
         finished(beacon->transmitPacket(0xFFFFFF, 74, 1, QByteArray(32, 'x')));
         QTRY_COMPARE(complete.size(), 1);
         QCOMPARE(text("radio.packet"), QStringLiteral("ffffff4a01") + QString::fromLatin1(QByteArray(32, 'x').toHex()));
@@ -134,9 +134,9 @@ private slots:
     {
         set("radio.version", "3.7");
         set("radio.check", 3);
-        const QSignalSpy versions(beacon.get(), &BeaconProcessor::firmwareVersionReceived);
-        const QSignalSpy checks(beacon.get(), &BeaconProcessor::checkRadioReplyReceived);
-        const QSignalSpy errors(beacon.get(), &BeaconProcessor::error);
+        const TestSupport::QueuedSpy versions(beacon.get(), &BeaconProcessor::firmwareVersionReceived);
+        const TestSupport::QueuedSpy checks(beacon.get(), &BeaconProcessor::checkRadioReplyReceived);
+        const TestSupport::QueuedSpy errors(beacon.get(), &BeaconProcessor::error);
         finished(beacon->requestFirmwareVersion());
         QTRY_COMPARE(versions.size(), 1);
         QVERIFY(versions[0][0].value<Utilities::VersionNumber>() == Utilities::VersionNumber(3, 7));
@@ -166,7 +166,7 @@ private slots:
 
     void refusalsErrorsAndTextsReachTheProgram()
     {
-        const QSignalSpy errors(beacon.get(), &BeaconProcessor::error);
+        const TestSupport::QueuedSpy errors(beacon.get(), &BeaconProcessor::error);
         set("radio.ack", "nak");
         set("radio.nak_code", 9);
         finished(beacon->sendPing());
@@ -187,8 +187,8 @@ private slots:
 
     void aSilentRadioTimesOutAndComesBack()
     {
-        const QSignalSpy errors(beacon.get(), &BeaconProcessor::error);
-        const QSignalSpy answers(beacon.get(), &BeaconProcessor::pingResponse);
+        const TestSupport::QueuedSpy errors(beacon.get(), &BeaconProcessor::error);
+        const TestSupport::QueuedSpy answers(beacon.get(), &BeaconProcessor::pingResponse);
         set("radio.ack", "off");
         QVERIFY(beacon->sendPing());
         QTRY_COMPARE_WITH_TIMEOUT(errors.size(), 1, 10'000);
@@ -200,7 +200,7 @@ private slots:
 
     void noFrameIsLostToNoiseBetweenFrames()
     {
-        const QSignalSpy answers(beacon.get(), &BeaconProcessor::pingResponse);
+        const TestSupport::QueuedSpy answers(beacon.get(), &BeaconProcessor::pingResponse);
         for (int count = 1; count <= 20; ++count) {
             set("radio.to_program.burst", 37);
             finished(beacon->sendPing());
@@ -219,7 +219,7 @@ private slots:
         for (const char* direction : {"radio.to_program", "radio.to_radio"})
             for (const char* fault : {".drop", ".insert", ".flip", ".duplicate"})
                 set(qPrintable(QString::fromLatin1(direction) + QLatin1String(fault)), 0);
-        const QSignalSpy answers(beacon.get(), &BeaconProcessor::pingResponse);
+        const TestSupport::QueuedSpy answers(beacon.get(), &BeaconProcessor::pingResponse);
         QTRY_VERIFY_WITH_TIMEOUT((finished(beacon->sendPing()), answers.size() > 0), 15'000);
     }
 };

@@ -14,7 +14,7 @@ immunityrig_test(MixerPluginTest SOURCES virtual-device/MixerPluginTest.cpp LIBR
 
 # The program's classes against the device's models: two sides that share no code.
 immunityrig_test(RadioCrossCheckTest SOURCES virtual-device/RadioCrossCheckTest.cpp LIBRARIES Domain VirtualDevice
-  LABELS integration)
+  LABELS unit)
 immunityrig_test(AudioCrossCheckTest SOURCES virtual-device/AudioCrossCheckTest.cpp LIBRARIES Domain VirtualDevice
   LABELS unit)
 target_compile_definitions(AudioCrossCheckTest PRIVATE MIXER_PLUGIN="$<TARGET_FILE:MixerPlugin>")
