@@ -14,6 +14,11 @@
 #include <QSignalSpy>
 #include <QTest>
 
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <array>
 #include <atomic>
 #include <future>
 #include <thread>
@@ -108,8 +113,10 @@ private slots:
         QFile::remove(resetFile);
     }
 
-    void opensTheDeviceAndPulsesTheResetLineOnce();
+    void opensTheDeviceAndPulsesTheResetLine();
+    void theResetLineIsPulsedOnce();
     void aMissingResetLineIsReportedWithItsPath();
+    void aResetLineWhoseLinkLeadsNowhereIsMissing();
     void aResetLineThatCannotBeOpenedIsReported();
     void aResetLineThatCannotBeWrittenIsReported();
     void aDeviceThatCannotBeOpenedIsReportedAndTheResetLineStillPulsed();
@@ -130,6 +137,7 @@ private slots:
     void refusalsAreReported_data();
     void refusalsAreReported();
     void aStartByteWithinARefusedFrameIsTriedNext();
+    void aFrameBehindADamagedOneArrivesOverTheLine();
     void randomFramesAmongGarbageArriveOverTheLine();
     void livesOnAnotherThreadThanThePort();
     void aMessageHandlerMayParseAgain();
@@ -138,7 +146,7 @@ private:
     std::unique_ptr<LogCapture> log;
 };
 
-void SerialProtocolTest::opensTheDeviceAndPulsesTheResetLineOnce()
+void SerialProtocolTest::opensTheDeviceAndPulsesTheResetLine()
 {
     const Pty pty;
     SerialPort port(pty.name(), SerialPort::Baud115200);
@@ -147,6 +155,32 @@ void SerialProtocolTest::opensTheDeviceAndPulsesTheResetLineOnce()
     QCOMPARE(port.openMode(), QIODevice::ReadWrite | QIODevice::Unbuffered);
     QCOMPARE(resetFileContent(), QByteArray("1"));
     QCOMPARE(log->texts(), QStringList());
+}
+
+/// A pipe keeps every write, where a file is emptied each time that it is opened.
+void SerialProtocolTest::theResetLineIsPulsedOnce()
+{
+    QVERIFY(QFile::remove(resetFile));
+    QCOMPARE(::mkfifo(qPrintable(resetFile), S_IRUSR | S_IWUSR), 0);
+    const int pipe = ::open(qPrintable(resetFile), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    {
+        Link link;
+        QVERIFY(link.settles());
+    }
+    std::array<char, 8> pulses{};
+    QCOMPARE(::read(pipe, pulses.data(), pulses.size()), ssize_t(1));
+    ::close(pipe);
+    QCOMPARE(pulses.front(), '1');
+    QCOMPARE(log->texts(), QStringList());
+}
+
+void SerialProtocolTest::aResetLineWhoseLinkLeadsNowhereIsMissing()
+{
+    QVERIFY(QFile::remove(resetFile));
+    QVERIFY(QFile::link("/sys/class/misc/msp430/gone", resetFile));
+    const Link link;
+    QVERIFY(log->waitFor(", Beacon processor reset line device file does not exist at" + resetFile));
+    QCOMPARE(log->lines().size(), std::size_t(1));
 }
 
 void SerialProtocolTest::aMissingResetLineIsReportedWithItsPath()
@@ -371,6 +405,29 @@ void SerialProtocolTest::aStartByteWithinARefusedFrameIsTriedNext()
     QCOMPARE(link.messages, QList<QByteArray>{"inner"});
     QVERIFY(log->waitFor(", Received invalid data checksum"));
     QCOMPARE(log->lines().size(), std::size_t(1));
+}
+
+/// Each bit of a frame flipped in turn, and each of its beginnings.
+void SerialProtocolTest::aFrameBehindADamagedOneArrivesOverTheLine()
+{
+    const QByteArray whole = frameOf("|whole\n");
+    QList<QByteArray> damaged;
+    for (qsizetype index = 0; index < whole.size(); ++index) {
+        damaged.append(whole.left(index));
+        for (int bit = 0; bit < 8; ++bit) {
+            damaged.append(whole);
+            damaged.last()[index] = static_cast<char>(whole.at(index) ^ (1 << bit));
+        }
+    }
+    Link link;
+    QList<QByteArray> expected;
+    for (const auto& bad : damaged) {
+        expected.append("next " + QByteArray::number(expected.size()));
+        link.pty.write(bad + frameOf(expected.last()) + silence);
+    }
+    QVERIFY(link.receives(expected.size()));
+    QVERIFY(link.settles());
+    QCOMPARE(link.messages, expected);
 }
 
 void SerialProtocolTest::randomFramesAmongGarbageArriveOverTheLine()

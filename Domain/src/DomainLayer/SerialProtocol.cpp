@@ -47,10 +47,11 @@ void warnOfRefusal(FrameParser::Outcome reason)
 /// The driver behind the file makes the pulse.
 void pulseResetLine()
 {
-    QFile file(resetFileName);
-    if (!file.exists())
+    // Of a link that leads nowhere a QFile object says that it exists.
+    if (!QFile::exists(resetFileName))
         return warn(__LINE__,
                     QStringLiteral("Beacon processor reset line device file does not exist at") + resetFileName);
+    QFile file(resetFileName);
     // Unbuffered: only then does the write tell of the driver's error.
     if (!file.open(QIODevice::WriteOnly | QIODevice::ExistingOnly | QIODevice::Unbuffered))
         return warn(__LINE__, QStringLiteral("Cannot open beacon processor reset line device file for writing"));
