@@ -6,12 +6,10 @@
 #include "tests/Domain/Radio.h"
 #include "tests/support/LogCapture.h"
 
-#include <QElapsedTimer>
 #include <QTest>
 
 #include <array>
 #include <atomic>
-#include <functional>
 #include <thread>
 #include <vector>
 
@@ -26,46 +24,6 @@ using TestSupport::RadioPeer;
 
 namespace
 {
-
-/// A real port whose writes come back late, as they do when the writing thread loses the processor.
-class LingeringPort : public SerialPort
-{
-public:
-    using SerialPort::SerialPort;
-
-    std::function<bool()> lingerUntil = [] { return true; };
-
-protected:
-    qint64 writeData(const char* bytes, qint64 count) override
-    {
-        const auto written = SerialPort::writeData(bytes, count);
-        const QDeadlineTimer deadline(generousMs);
-        while (!lingerUntil() && !deadline.hasExpired())
-            std::this_thread::yield();
-        return written;
-    }
-};
-
-/// A real port whose first write fails, after a while.
-class FailingFirstWritePort : public SerialPort
-{
-public:
-    using SerialPort::SerialPort;
-
-    std::atomic<bool> entered = false;
-    std::atomic<bool> released = false;
-
-protected:
-    qint64 writeData(const char* bytes, qint64 count) override
-    {
-        if (entered.exchange(true))
-            return SerialPort::writeData(bytes, count);
-        const QDeadlineTimer deadline(generousMs);
-        while (!released && !deadline.hasExpired())
-            std::this_thread::yield();
-        return -1;
-    }
-};
 
 /// A real port that knows who has written to it, and fails one write if it is told to.
 class WatchedPort : public SerialPort
@@ -87,7 +45,7 @@ protected:
 
 } // namespace
 
-/// One command in flight, the others waiting: order, time-outs, failures, threads, beginning and end.
+/// One command in flight, the others waiting: order, failures, threads, beginning and end.
 class BeaconEngineTest : public QObject
 {
     Q_OBJECT
@@ -99,15 +57,10 @@ private slots:
     void onlyOneCommandIsInFlight();
     void sevenCommandsBackToBackAllArriveAndTwoWarn();
     void aRefusedCommandIsFollowedByTheNext();
-    void aTimedOutCommandIsFollowedByTheNextAndNotRepeated();
-    void anAcknowledgementWithDataLeavesTheCommandToTimeOut();
     void aRefusalWithoutAReasonEndsNothing();
     void repliesForNobodyDoNoHarm();
-    void aFailedSendLeavesTheCommandPendingWithoutATimer();
     void aFailedQueuedSendClearsThePendingFlag();
     void afterAFailedQueuedSendTheNextCommandGoesOutAtOnce();
-    void aTimeoutWithNothingPendingIsSilent();
-    void anAcknowledgementHandledBeforeTheWriteReturnsLeavesNoTimerBehind();
     void pendingEndsWithoutTheCallersEventLoop();
     void commandsOfManyThreadsAllArriveInEachThreadsOrder();
     void aCommandRightAfterConstructionIsSent();
@@ -117,7 +70,6 @@ private slots:
     void aNewProcessorGoesOnWithAnOpenPort();
     void anErrorIsToldBeforeTheNextCommandGoesOut_data();
     void anErrorIsToldBeforeTheNextCommandGoesOut();
-    void aFailedSendLeavesTheTimerOfACommandSentMeanwhileAlone();
     void theFirstCommandIsWrittenByItsCallerAndTheQueuedOneByTheWorker();
     void repliesAreToldOnAWorkerThreadOfHighPriority();
     void theObjectsOfTheWorkerAreMadeOnce();
@@ -182,39 +134,6 @@ void BeaconEngineTest::aRefusedCommandIsFollowedByTheNext()
     QVERIFY(radio.processor.isCommandPending());
 }
 
-void BeaconEngineTest::aTimedOutCommandIsFollowedByTheNextAndNotRepeated()
-{
-    Radio radio;
-    QElapsedTimer clock;
-    clock.start();
-    QVERIFY(radio.processor.sendPing());
-    QVERIFY(radio.processor.checkRadioInterface());
-    radio.peer.answerWith(
-        [](const QByteArray& command) { return command == "\x62" ? RadioPeer::ack() : QByteArray(); });
-    QVERIFY(radio.takes({"\x7E", "\x62"}));
-    QVERIFY(radio.tells({"error 1"}));
-    QVERIFY2(clock.elapsed() >= 3000, qPrintable(QString::number(clock.elapsed())));
-    QVERIFY(log->waitFor(", Beacon processor timed out"));
-    QVERIFY(radio.becomesIdle());
-    QVERIFY(radio.settles());
-    QCOMPARE(radio.peer.commands().size(), 2);
-    QCOMPARE(log->lines().size(), std::size_t(1));
-}
-
-void BeaconEngineTest::anAcknowledgementWithDataLeavesTheCommandToTimeOut()
-{
-    Radio radio;
-    QVERIFY(radio.processor.sendPing());
-    QVERIFY(radio.processor.checkRadioInterface());
-    radio.says(QByteArray("\xFE\x00", 2));
-    QVERIFY(radio.tells({"error 4"}));
-    QVERIFY(radio.settles());
-    QVERIFY(radio.processor.isCommandPending());
-    QCOMPARE(radio.peer.commands().size(), 1);
-    QVERIFY(radio.tells({"error 4", "error 1"}));
-    QVERIFY(radio.takes({"\x7E", "\x62"}));
-}
-
 void BeaconEngineTest::aRefusalWithoutAReasonEndsNothing()
 {
     Radio radio;
@@ -237,27 +156,6 @@ void BeaconEngineTest::repliesForNobodyDoNoHarm()
     radio.peer.answerWith(RadioPeer::wellBehaved);
     QVERIFY(radio.processor.sendPing());
     QVERIFY(radio.tells({"error 0", "pingResponse"}));
-}
-
-void BeaconEngineTest::aFailedSendLeavesTheCommandPendingWithoutATimer()
-{
-    const Pty pty;
-    auto lost = std::make_unique<Pty>();
-    SerialPort port(lost->name(), SerialPort::Baud115200);
-    BeaconProcessor processor(port);
-    int errors = 0;
-    connect(
-        &processor, &BeaconProcessor::error, this, [&] { ++errors; }, Qt::DirectConnection);
-    lost.reset();
-    QVERIFY(!processor.sendPing());
-    QVERIFY(log->waitFor(", Unable to send serial packet"));
-    QVERIFY(processor.isCommandPending());
-    QVERIFY(processor.sendPing());
-    // A timer would have run out by then.
-    QTest::qWait(3500);
-    QVERIFY(processor.isCommandPending());
-    QCOMPARE(errors, 0);
-    QCOMPARE(log->count(", Beacon processor timed out"), 0);
 }
 
 void BeaconEngineTest::aFailedQueuedSendClearsThePendingFlag()
@@ -291,34 +189,6 @@ void BeaconEngineTest::afterAFailedQueuedSendTheNextCommandGoesOutAtOnce()
     QTRY_COMPARE(peer.commands(), (QList<QByteArray>{"\x7E", "\x61"}));
     pty.write(RadioPeer::ack());
     QTRY_COMPARE(peer.commands(), (QList<QByteArray>{"\x7E", "\x61", "\x65"}));
-}
-
-void BeaconEngineTest::aTimeoutWithNothingPendingIsSilent()
-{
-    Radio radio;
-    QMetaObject::invokeMethod(&radio.processor, "timeout", Qt::BlockingQueuedConnection);
-    QVERIFY(radio.settles());
-    QCOMPARE(radio.events, QStringList());
-    QCOMPARE(log->texts(), QStringList());
-}
-
-void BeaconEngineTest::anAcknowledgementHandledBeforeTheWriteReturnsLeavesNoTimerBehind()
-{
-    Pty pty;
-    LingeringPort port(pty.name(), SerialPort::Baud115200);
-    BeaconProcessor processor(port);
-    RadioPeer peer(pty);
-    peer.answerWith(RadioPeer::wellBehaved);
-    int errors = 0;
-    connect(
-        &processor, &BeaconProcessor::error, this, [&] { ++errors; }, Qt::DirectConnection);
-    port.lingerUntil = [&] { return !processor.isCommandPending(); };
-    QVERIFY(processor.sendPing());
-    QVERIFY(!processor.isCommandPending());
-    // A timer that was left behind would have run out by then.
-    QTest::qWait(3500);
-    QCOMPARE(errors, 0);
-    QCOMPARE(log->texts(), QStringList());
 }
 
 void BeaconEngineTest::pendingEndsWithoutTheCallersEventLoop()
@@ -459,32 +329,6 @@ void BeaconEngineTest::anErrorIsToldBeforeTheNextCommandGoesOut()
         QMetaObject::invokeMethod(&processor, "timeout", Qt::BlockingQueuedConnection);
     QCOMPARE(writesBefore.load(), 1);
     QCOMPARE(port.writes.load(), 2);
-}
-
-/// Its timer was on the way to be stopped when the next command got the timer.
-void BeaconEngineTest::aFailedSendLeavesTheTimerOfACommandSentMeanwhileAlone()
-{
-    Pty pty;
-    FailingFirstWritePort port(pty.name(), SerialPort::Baud115200);
-    BeaconProcessor processor(port);
-    const RadioPeer peer(pty);
-    std::atomic<int> errors = 0;
-    connect(
-        &processor, &BeaconProcessor::error, this, [&] { ++errors; }, Qt::DirectConnection);
-    std::atomic<bool> sent = true;
-    std::thread caller([&] { sent = processor.sendPing(); });
-    const bool entered = QTest::qWaitFor([&] { return port.entered.load(); }, generousMs);
-    const bool queued = processor.checkRadioInterface();
-    // An acknowledgement that belongs to nobody.
-    QMetaObject::invokeMethod(&processor, "processMessage", Qt::BlockingQueuedConnection,
-                              Q_ARG(QByteArray, QByteArray("\xFE")));
-    const bool taken = QTest::qWaitFor([&] { return peer.commands() == QList<QByteArray>{"\x62"}; }, generousMs);
-    port.released = true;
-    caller.join();
-    QVERIFY(entered && queued && taken && !sent);
-    QTRY_COMPARE_WITH_TIMEOUT(errors.load(), 1, generousMs);
-    QVERIFY(log->waitFor(", Beacon processor timed out"));
-    QTRY_VERIFY(!processor.isCommandPending());
 }
 
 void BeaconEngineTest::theFirstCommandIsWrittenByItsCallerAndTheQueuedOneByTheWorker()

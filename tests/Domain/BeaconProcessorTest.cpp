@@ -242,6 +242,8 @@ void BeaconProcessorTest::everyReplyHasItsSignal()
     Radio radio;
     radio.says(QByteArray::fromHex(hex));
     QVERIFY(radio.tells(events));
+    QVERIFY(radio.settles());
+    QCOMPARE(radio.events, events);
     QCOMPARE(log->texts(), QStringList());
 }
 
@@ -276,6 +278,8 @@ void BeaconProcessorTest::aReplyOfTheWrongLengthIsAnError()
     Radio radio;
     radio.says(static_cast<char>(code) + QByteArray(length, '\1'));
     QVERIFY(radio.tells({"error 4"}));
+    QVERIFY(radio.settles());
+    QCOMPARE(radio.events, QStringList{"error 4"});
     QVERIFY(log->waitFor(", " + text));
     QCOMPARE(log->lines().size(), std::size_t(1));
 }
@@ -286,6 +290,9 @@ void BeaconProcessorTest::anEmptyMessageIsAnError()
     radio.says({});
     QVERIFY(radio.tells({"error 3"}));
     QVERIFY(log->waitFor(", Received empty message"));
+    QVERIFY(radio.settles());
+    QCOMPARE(radio.events, QStringList{"error 3"});
+    QCOMPARE(log->lines().size(), std::size_t(1));
 }
 
 void BeaconProcessorTest::anUnknownMessageIsAnErrorAndLoggedInHexadecimal()
@@ -299,6 +306,8 @@ void BeaconProcessorTest::anUnknownMessageIsAnErrorAndLoggedInHexadecimal()
             radio.says(QByteArray(1, static_cast<char>(code)));
     }
     QVERIFY(radio.tells(QStringList(249, "error 2")));
+    QVERIFY(radio.settles());
+    QCOMPARE(radio.events.size(), 249);
 }
 
 void BeaconProcessorTest::aRadioCheckAboveThreeIsOutOfRange_data()
@@ -318,6 +327,8 @@ void BeaconProcessorTest::aRadioCheckAboveThreeIsOutOfRange()
     Radio radio;
     radio.says(QByteArray("\x63") + static_cast<char>(value));
     QVERIFY(radio.tells({"error 5"}));
+    QVERIFY(radio.settles());
+    QCOMPARE(radio.events, QStringList{"error 5"});
     QVERIFY2(log->waitFor(", Received check radio response with out of range value " + shown),
              qPrintable(log->texts().value(0)));
 }

@@ -11,3 +11,5 @@ immunityrig_test(BeaconProcessorTest SOURCES Domain/BeaconProcessorTest.cpp Doma
   Domain/RadioPeer.cpp LIBRARIES Domain LABELS unit)
 immunityrig_test(BeaconEngineTest SOURCES Domain/BeaconEngineTest.cpp Domain/Frames.cpp Domain/Pty.cpp
   Domain/RadioPeer.cpp LIBRARIES Domain LABELS unit)
+immunityrig_test(BeaconTimeOutTest SOURCES Domain/BeaconTimeOutTest.cpp Domain/Frames.cpp Domain/Pty.cpp
+  Domain/RadioPeer.cpp LIBRARIES Domain LABELS unit)
