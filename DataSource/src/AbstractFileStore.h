@@ -46,8 +46,8 @@ public slots:
 
 signals:
     void scanComplete();
-    /// While a file that is not empty is being deleted: 0 at first. The end is `deleteComplete()`, not a 100, which is
-    /// only seen when the rest is too small to count as a hundredth.
+    /// While a file that is not empty is being deleted: 0 at first, 99 at most. A 100 would say that the file is gone
+    /// while there still is some of it, be it less than a hundredth; that it is gone is for `deleteComplete()` to say.
     void deleteProgress(qint32 percent);
     void deleteComplete();
 };

@@ -3,12 +3,12 @@
 
 #include "DataSource/src/FileStore.h"
 
+#include "DataSource/src/FileListing.h"
 #include "DataSource/src/FileStoreContents.h"
 #include "DataSource/src/FileSystemSpace.h"
 #include "utilities/Debug.h"
 
 #include <QDir>
-#include <QDirIterator>
 #include <QFutureWatcher>
 #include <QPromise>
 #include <QRunnable>
@@ -39,7 +39,8 @@ void warn(int line, const QString& text)
     Utilities::Debug::warningMessage(__FILE__, line, text);
 }
 
-/// Work for the global thread pool, whose end its future reports.
+/// Work for the global thread pool, whose end its future reports. It is no `QtConcurrent::run`, whose task is read on
+/// the pool's thread before it comes to the work, and so before `handedOver` could show a sanitizer the threads' order.
 class PoolTask : public QRunnable
 {
 public:
@@ -82,7 +83,6 @@ public:
     {
     }
 
-    [[nodiscard]] FileSystemSpace space(int warningLine) const;
     [[nodiscard]] std::optional<QFileInfo> fileToDelete(unsigned int index) const;
 
     const QDir directory;
@@ -97,35 +97,20 @@ public:
     QFutureWatcher<void> deleteWatcher;
 };
 
-FileSystemSpace FileStore::PrivateData::space(int warningLine) const
-{
-    if (!directory.exists())
-        return {};
-    const auto space = FileSystemSpace::of(directory.absolutePath());
-    if (!space)
-        warn(warningLine, QStringLiteral("Unable to obtain file system information"));
-    return space.value_or(FileSystemSpace());
-}
-
 std::optional<QFileInfo> FileStore::PrivateData::fileToDelete(unsigned int index) const
 {
-    QDirIterator listing(directory.absolutePath(), QDir::Files);
-    QFileInfo file;
-    if (listing.hasNext())
-        file = listing.nextFileInfo();
-    for (unsigned int position = 0; position < index; ++position) {
-        if (!listing.hasNext()) {
-            warn(deleteBeyondEndLine, QStringLiteral("Attempting to delete a file index larger than the number of "
-                                                     "files in the directory"));
-            return std::nullopt;
-        }
-        file = listing.nextFileInfo();
+    FileListing listing(directory.absolutePath());
+    listing.step();
+    if (!listing.step(index)) {
+        warn(deleteBeyondEndLine, QStringLiteral("Attempting to delete a file index larger than the number of files in "
+                                                 "the directory"));
+        return std::nullopt;
     }
-    if (!file.exists()) {
+    if (!listing.hasRecord()) {
         warn(deleteNothingLine, QStringLiteral("Attempting to delete a file that does not exist"));
         return std::nullopt;
     }
-    return file;
+    return listing.record();
 }
 
 FileStore::FileStore(const QString& path) : d(std::make_unique<PrivateData>(this, path))
@@ -165,12 +150,12 @@ qint64 FileStore::bytesUsed() const
 
 qint64 FileStore::bytesFree() const
 {
-    return d->space(unknownFreeSpaceLine).free;
+    return FileSystemSpace::of(d->directory, __FILE__, unknownFreeSpaceLine).free;
 }
 
 qint64 FileStore::bytesCapacity() const
 {
-    return d->space(unknownCapacityLine).capacity;
+    return FileSystemSpace::of(d->directory, __FILE__, unknownCapacityLine).capacity;
 }
 
 bool FileStore::isScanning() const

@@ -3,7 +3,8 @@
 
 #include "DataSource/src/FileStoreContents.h"
 
-#include <QDirIterator>
+#include "DataSource/src/FileListing.h"
+
 #include <QFile>
 #include <QList>
 
@@ -22,6 +23,7 @@ namespace
 constexpr int cacheCapacity = 30;
 constexpr int cacheStep = 15;
 constexpr qint64 shrinkStep = 10LL * 1024 * 1024;
+constexpr qint64 greatestPercent = 99;
 
 class FileDescriptor
 {
@@ -38,42 +40,6 @@ public:
 
 private:
     int descriptor;
-};
-
-/// The directory's files in the file system's own order, with a current entry as soon as there is one.
-class Listing
-{
-public:
-    explicit Listing(const QString& path) : iterator(path, QDir::Files) { step(); }
-
-    /// False at the end of the listing, where the last entry stays current.
-    bool step()
-    {
-        if (!iterator.hasNext())
-            return false;
-        iterator.next();
-        started = true;
-        return true;
-    }
-
-    /// Whether the listing has that many more entries; the last of them is current then.
-    bool step(qsizetype times)
-    {
-        for (qsizetype done = 0; done < times; ++done) {
-            if (!step())
-                return false;
-        }
-        return true;
-    }
-
-    /// Whether there is a current entry and it has not vanished.
-    [[nodiscard]] bool hasRecord() const { return started && iterator.fileInfo().exists(); }
-    [[nodiscard]] bool isEmpty() const { return !started; }
-    [[nodiscard]] QFileInfo record() const { return iterator.fileInfo(); }
-
-private:
-    QDirIterator iterator;
-    bool started = false;
 };
 
 /// A descriptor to shrink the file with; none if that could change anything outside the directory.
@@ -133,8 +99,9 @@ void FileStoreContents::fillCache()
 void FileStoreContents::fillCacheLocked()
 {
     cache.clear();
-    Listing listing(path);
-    for (int filled = 0; filled < cacheCapacity && !listing.isEmpty(); ++filled) {
+    FileListing listing(path);
+    listing.step();
+    for (int filled = 0; filled < cacheCapacity && !listing.isBeforeFirst(); ++filled) {
         if (listing.hasRecord())
             cache.append(listing.record());
         listing.step();
@@ -155,15 +122,15 @@ void FileStoreContents::checkCache(int index)
 
 void FileStoreContents::restartCacheAt(int index)
 {
-    Listing listing(path);
-    if (!listing.isEmpty() && listing.step(index))
+    FileListing listing(path);
+    if (listing.step(qint64(index) + 1))
         cache.insert(index, listing.record());
 }
 
 void FileStoreContents::moveCacheForward()
 {
-    Listing listing(path);
-    if (!listing.step(cache.lastIndex()))
+    FileListing listing(path);
+    if (!listing.step(cache.lastIndex() + 1))
         return;
     for (int taken = 0; taken < cacheStep && listing.step(); ++taken)
         cache.append(listing.record());
@@ -175,9 +142,9 @@ void FileStoreContents::moveCacheBackTo(int index)
         fillCacheLocked();
         return;
     }
-    Listing listing(path);
+    FileListing listing(path);
     QList<QFileInfo> records;
-    if (listing.isEmpty() || !listing.step(index - (cacheStep - 1)))
+    if (!listing.step(index - cacheStep + 2))
         return;
     do
         records.append(listing.record());
@@ -196,11 +163,10 @@ void FileStoreContents::scanDirectory(const std::atomic<bool>& wanted)
     }
     int files = 0;
     qint64 bytes = 0;
-    QDirIterator listing(path, QDir::Files);
-    while (listing.hasNext() && wanted) {
-        listing.next();
+    FileListing listing(path);
+    while (wanted && listing.step()) {
         ++files;
-        bytes += listing.fileInfo().size();
+        bytes += listing.record().size();
     }
     const std::lock_guard lock(mutex);
     fileCount = files;
@@ -211,32 +177,27 @@ void FileStoreContents::scanDirectory(const std::atomic<bool>& wanted)
 void FileStoreContents::deleteFile(const QString& filePath)
 {
     const QFileInfo record(filePath);
+    const qint64 size = record.size();
     {
         // Before the first scan there is nothing to subtract from.
         const std::lock_guard lock(mutex);
-        byteCount = std::max<qint64>(byteCount - record.size(), 0);
+        byteCount = std::max<qint64>(byteCount - size, 0);
         fileCount = std::max(fileCount - 1, 0);
     }
     const FileDescriptor directory(::open(QFile::encodeName(path).constData(), O_PATH | O_DIRECTORY | O_CLOEXEC));
     const QByteArray name = QFile::encodeName(record.fileName());
-    shrink(directory.get(), name.constData());
+    shrink(directory.get(), name.constData(), size);
     ::unlinkat(directory.get(), name.constData(), 0);
     fillCache();
 }
 
-void FileStoreContents::shrink(int directory, const char* name)
+void FileStoreContents::shrink(int directory, const char* name, qint64 size)
 {
-    struct stat status
-    {
-    };
-    if (::fstatat(directory, name, &status, AT_SYMLINK_NOFOLLOW) != 0 || !S_ISREG(status.st_mode))
-        return;
     const FileDescriptor file(openedForShrinking(directory, name));
-    const qint64 size = status.st_size;
     for (qint64 length = size; length > 0; length -= shrinkStep) {
-        // A file that cannot be shrunk is removed in one go; the reports keep their rhythm.
+        // What cannot be shrunk is removed in one go; the reports keep their rhythm.
         [[maybe_unused]] const int ignored = file.get() >= 0 ? ::ftruncate(file.get(), length) : -1;
-        report(static_cast<qint32>(100 - length * 100 / size));
+        report(static_cast<qint32>(std::min(100 - length * 100 / size, greatestPercent)));
     }
 }
 

@@ -41,7 +41,8 @@ public:
     void scanDirectory(const std::atomic<bool>& wanted);
     /// Removes one of the directory's files. A large file is shrunk from its end first, in steps of 10 MiB: freeing it
     /// at once would keep a slow flash busy for long. Only the entry in the directory is touched: a symbolic link is
-    /// not followed, and a file that has another name elsewhere is not shrunk.
+    /// not followed, and a file that has another name elsewhere is not shrunk. Both report progress all the same, by
+    /// the size that they count with: a link by its target's.
     void deleteFile(const QString& filePath);
 
 private:
@@ -51,7 +52,7 @@ private:
     void moveCacheForward();
     void moveCacheBackTo(int index);
     void report(qint32 percent);
-    void shrink(int directory, const char* name);
+    void shrink(int directory, const char* name, qint64 size);
 
     const QString path;
 

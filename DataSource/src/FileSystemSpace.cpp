@@ -3,6 +3,8 @@
 
 #include "DataSource/src/FileSystemSpace.h"
 
+#include "utilities/Debug.h"
+
 #include <QFile>
 
 #include <sys/statvfs.h>
@@ -10,13 +12,17 @@
 namespace DataSource
 {
 
-std::optional<FileSystemSpace> FileSystemSpace::of(const QString& directory)
+FileSystemSpace FileSystemSpace::of(const QDir& directory, const char* file, int line)
 {
+    if (!directory.exists())
+        return {};
     struct statvfs status
     {
     };
-    if (::statvfs(QFile::encodeName(directory).constData(), &status) != 0)
-        return std::nullopt;
+    if (::statvfs(QFile::encodeName(directory.absolutePath()).constData(), &status) != 0) {
+        Utilities::Debug::warningMessage(file, line, QStringLiteral("Unable to obtain file system information"));
+        return {};
+    }
     // Widened first: on the device the factors have 32 bits.
     const auto blockSize = static_cast<qint64>(status.f_bsize);
     return FileSystemSpace{blockSize * static_cast<qint64>(status.f_blocks),

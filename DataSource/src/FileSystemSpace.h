@@ -3,9 +3,7 @@
 
 #pragma once
 
-#include <QString>
-
-#include <optional>
+#include <QDir>
 
 namespace DataSource
 {
@@ -16,8 +14,9 @@ struct FileSystemSpace
     qint64 capacity = 0;
     qint64 free = 0; ///< the superuser's reserve included
 
-    /// Nothing when the system does not say.
-    [[nodiscard]] static std::optional<FileSystemSpace> of(const QString& directory);
+    /// 0 when the directory is gone or, with a warning in the log from that file and line, when the system does not
+    /// say.
+    [[nodiscard]] static FileSystemSpace of(const QDir& directory, const char* file, int line);
 };
 
 } // namespace DataSource

@@ -3,11 +3,10 @@
 
 #include "DataSource/src/KeyedFileStore.h"
 
+#include "DataSource/src/FileListing.h"
 #include "DataSource/src/FileSystemSpace.h"
-#include "utilities/Debug.h"
 
 #include <QDir>
-#include <QDirIterator>
 
 namespace DataSource
 {
@@ -31,21 +30,8 @@ class KeyedFileStore::PrivateData
 public:
     explicit PrivateData(const QString& path) : directory(path) {}
 
-    [[nodiscard]] FileSystemSpace space(int warningLine) const;
-
     QDir directory;
 };
-
-FileSystemSpace KeyedFileStore::PrivateData::space(int warningLine) const
-{
-    if (!directory.exists())
-        return {};
-    const auto space = FileSystemSpace::of(directory.absolutePath());
-    if (!space)
-        Utilities::Debug::warningMessage(__FILE__, warningLine,
-                                         QStringLiteral("Unable to obtain file system information"));
-    return space.value_or(FileSystemSpace());
-}
 
 KeyedFileStore::KeyedFileStore(const QString& path) : d(std::make_unique<PrivateData>(path))
 {
@@ -73,22 +59,20 @@ bool KeyedFileStore::deleteFile(const QString& name)
 qint64 KeyedFileStore::bytesUsed() const
 {
     qint64 total = 0;
-    QDirIterator listing(d->directory.absolutePath(), QDir::Files);
-    while (listing.hasNext()) {
-        listing.next();
-        total += listing.fileInfo().size();
-    }
+    FileListing listing(d->directory.absolutePath());
+    while (listing.step())
+        total += listing.record().size();
     return total;
 }
 
 qint64 KeyedFileStore::bytesFree() const
 {
-    return d->space(unknownFreeSpaceLine).free;
+    return FileSystemSpace::of(d->directory, __FILE__, unknownFreeSpaceLine).free;
 }
 
 qint64 KeyedFileStore::bytesCapacity() const
 {
-    return d->space(unknownCapacityLine).capacity;
+    return FileSystemSpace::of(d->directory, __FILE__, unknownCapacityLine).capacity;
 }
 
 } // namespace DataSource

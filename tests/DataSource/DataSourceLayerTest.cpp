@@ -6,11 +6,16 @@
 #include "DataSource/src/AbstractConfigurationData.h"
 #include "DataSource/src/AbstractFileStore.h"
 #include "DataSource/src/AbstractKeyedFileStore.h"
+#include "tests/support/DirectoryEvents.h"
 #include "tests/support/LoggedTexts.h"
 
 #include <QDir>
 #include <QTemporaryDir>
 #include <QTest>
+
+#include <sys/inotify.h>
+
+#include <memory>
 
 using DataSource::AbstractConfigurationData;
 using DataSource::DataSourceLayer;
@@ -40,6 +45,8 @@ private slots:
     void createsTheStoreDirectoriesUnderAnEmptyRoot();
     void doesNotCreateTheDirectoryOfTheSettings();
     void rootWithoutSlashIsPutBeforeThePathsAsItIs();
+    void storesAreMadeInTheOrderOfTheAccessors();
+    void storesGoInReverseOrder();
     void everyAccessorGivesItsStore();
     void accessorsReturnTheSameObjectEveryTime();
     void settingsAreKeptInTheFileUnderTheRoot();
@@ -72,6 +79,56 @@ void DataSourceLayerTest::rootWithoutSlashIsPutBeforeThePathsAsItIs()
     QVERIFY(QFileInfo(root.filePath("xmnt/boot/protocols/wireless")).isDir());
     QVERIFY(QFileInfo(root.filePath("xetc/sounds")).isDir());
     QVERIFY(!QFile::exists(root.filePath("x")));
+}
+
+void DataSourceLayerTest::storesAreMadeInTheOrderOfTheAccessors()
+{
+    const QTemporaryDir root;
+    for (const char* const parent : {"mnt/boot/protocols", "mnt/data/protocols", "mnt/sysdata", "etc"})
+        QVERIFY(QDir(root.path()).mkpath(parent));
+    QFile configuration(root.filePath("mnt/sysdata/configuration"));
+    QVERIFY(configuration.open(QIODevice::WriteOnly));
+    configuration.close();
+    QStringList expected;
+    QStringList parents;
+    for (const auto& directory : directories) {
+        expected.append(root.filePath(directory));
+        parents.append(QFileInfo(root.filePath(directory)).path());
+    }
+    expected.insert(6, configuration.fileName());
+    parents.append(root.filePath("mnt/sysdata"));
+    TestSupport::DirectoryEvents events(parents, IN_CREATE | IN_OPEN);
+    const DataSourceLayer layer(root.path() + "/");
+    QStringList seen;
+    for (const auto& event : events.take()) {
+        const bool isOpened = (event.mask & IN_OPEN) != 0 && event.path == configuration.fileName();
+        if (isOpened || (event.mask & IN_CREATE) != 0)
+            seen.append(event.path);
+    }
+    seen.removeDuplicates();
+    QCOMPARE(seen, expected);
+}
+
+void DataSourceLayerTest::storesGoInReverseOrder()
+{
+    const QTemporaryDir root;
+    auto layer = std::make_unique<DataSourceLayer>(root.path() + "/");
+    // Those that can be seen to go; the rest are stores without a life of their own.
+    const QList<std::pair<QString, QObject*>> stores{
+        {"default wireless protocols", &layer->defaultWirelessProtocolFileStore()},
+        {"default tethered protocols", &layer->defaultTetheredProtocolFileStore()},
+        {"wireless protocols", &layer->wirelessProtocolFileStore()},
+        {"tethered protocols", &layer->tetheredProtocolFileStore()},
+        {"configuration", &layer->configurationData()},
+        {"data", &layer->dataFileStore()}};
+    QStringList gone;
+    QStringList expected;
+    for (const auto& [name, store] : stores) {
+        connect(store, &QObject::destroyed, this, [&gone, name = name] { gone.append(name); });
+        expected.prepend(name);
+    }
+    layer.reset();
+    QCOMPARE(gone, expected);
 }
 
 void DataSourceLayerTest::everyAccessorGivesItsStore()

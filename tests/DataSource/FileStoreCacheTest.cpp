@@ -3,50 +3,29 @@
 
 #include "DataSource/src/FileStore.h"
 #include "tests/DataSource/FileStoreFixture.h"
+#include "tests/support/DirectoryEvents.h"
 
 #include <QTest>
 
 #include <sys/inotify.h>
-#include <unistd.h>
 
-#include <array>
+#include <algorithm>
 #include <climits>
 
 using DataSource::FileStore;
+using TestSupport::DirectoryEvents;
 using TestSupport::FileStoreFixture;
 
 namespace
 {
 
-/// How often a directory is opened for listing, as the kernel sees it.
-class ListingCounter
+/// How often the directory was opened for listing since the last call. Equal events in a row come as one, so every
+/// access is counted by itself.
+qsizetype listingsOf(DirectoryEvents& events)
 {
-public:
-    explicit ListingCounter(const QString& directory) : descriptor(::inotify_init1(IN_NONBLOCK | IN_CLOEXEC))
-    {
-        ::inotify_add_watch(descriptor, qPrintable(directory), IN_OPEN | IN_ONLYDIR);
-    }
-    ~ListingCounter() { ::close(descriptor); }
-    Q_DISABLE_COPY_MOVE(ListingCounter)
-
-    /// Since the last call.
-    int take()
-    {
-        // The kernel merges equal events that follow each other unread, so every access is counted by itself.
-        int opened = 0;
-        alignas(inotify_event) std::array<char, 4096> buffer{};
-        for (ssize_t length = 0; (length = ::read(descriptor, buffer.data(), buffer.size())) > 0;)
-            for (ssize_t offset = 0; offset < length;) {
-                const auto* const event = reinterpret_cast<const inotify_event*>(buffer.data() + offset);
-                opened += (event->mask & IN_ISDIR) != 0 ? 1 : 0;
-                offset += static_cast<ssize_t>(sizeof(inotify_event) + event->len);
-            }
-        return opened;
-    }
-
-private:
-    int descriptor;
-};
+    const auto opened = events.take();
+    return std::count_if(opened.begin(), opened.end(), [](const auto& event) { return (event.mask & IN_ISDIR) != 0; });
+}
 
 } // namespace
 
@@ -78,9 +57,9 @@ private:
 bool FileStoreCacheTest::isCached(FileStore& store, int index)
 {
     const auto names = listing();
-    ListingCounter counter(directory());
+    DirectoryEvents counter({directory()}, IN_OPEN);
     const auto record = store.fileAt(index);
-    const int opened = counter.take();
+    const auto opened = listingsOf(counter);
     if (index < names.size() && record.fileName() != names.at(index))
         qWarning("Position %d is %s, not %s", index, qPrintable(record.fileName()), qPrintable(names.at(index)));
     return opened == 0;
@@ -181,17 +160,17 @@ void FileStoreCacheTest::pagingListsOncePerFifteenEntries()
     constexpr int files = 600;
     makeFiles(files, 1);
     FileStore store(directory());
-    ListingCounter counter(directory());
-    int listings = 0;
+    DirectoryEvents counter({directory()}, IN_OPEN);
+    qsizetype listings = 0;
     for (int index = 0; index < files; ++index) {
         QVERIFY(store.fileAt(index).exists());
-        listings += counter.take();
+        listings += listingsOf(counter);
     }
     QCOMPARE(listings, (files - 30) / 15);
     listings = 0;
     for (int index = files - 1; index >= 0; --index) {
         QVERIFY(store.fileAt(index).exists());
-        listings += counter.take();
+        listings += listingsOf(counter);
     }
     QCOMPARE(listings, (files - 30) / 15);
 }

@@ -13,6 +13,21 @@
 #include <condition_variable>
 #include <mutex>
 
+extern "C" int statvfs(const char* path, struct statvfs* status) noexcept
+{
+    using Function = int (*)(const char*, struct statvfs*);
+    static const auto real = reinterpret_cast<Function>(TestSupport::nextSymbol("statvfs"));
+    if (TestSupport::SpaceCalls::failing > 0) {
+        --TestSupport::SpaceCalls::failing;
+        errno = EIO;
+        return -1;
+    }
+    const int result = real(path, status);
+    if (TestSupport::SpaceCalls::claimed)
+        *status = *TestSupport::SpaceCalls::claimed;
+    return result;
+}
+
 namespace TestSupport
 {
 
@@ -100,6 +115,39 @@ unsigned int FileStoreFixture::positionOf(const QString& name) const
 QStringList FileStoreFixture::oddNames()
 {
     return {QStringLiteral("m\u00fcsik \u20ac \U0001F600"), "two\nlines", " ", "%s%n", "-rf", "a\\b", "quo\"te", "?"};
+}
+
+void FileStoreFixture::checkThatSpaceIsTheFileSystems(const std::function<Space()>& space) const
+{
+    struct statvfs status
+    {
+    };
+    QCOMPARE(::statvfs(qPrintable(directory()), &status), 0);
+    const Space before = space();
+    QCOMPARE(before.capacity, static_cast<qint64>(status.f_bsize * status.f_blocks));
+    QVERIFY(before.capacity > 0);
+    QFile file(path("used"));
+    QVERIFY(file.open(QIODevice::WriteOnly));
+    QCOMPARE(file.write(QByteArray(1 << 20, 'x')), 1 << 20);
+    file.close();
+    QVERIFY(before.free - space().free >= 1 << 20);
+}
+
+void FileStoreFixture::checkThatSpaceIsCountedInBlocksWithTheSuperusersReserve(const std::function<Space()>& space)
+{
+    struct statvfs card
+    {
+    };
+    card.f_bsize = 4096;
+    card.f_frsize = 512;
+    card.f_blocks = 3'000'000'000;
+    card.f_bfree = 2'000'000'000;
+    card.f_bavail = 1'000'000'000;
+    SpaceCalls::claimed = card;
+    const Space claimed = space();
+    SpaceCalls::claimed.reset();
+    QCOMPARE(claimed.capacity, 12'288'000'000'000);
+    QCOMPARE(claimed.free, 8'192'000'000'000);
 }
 
 void FileStoreFixture::scan(DataSource::AbstractFileStore& store)

@@ -10,7 +10,11 @@
 #include <QObject>
 #include <QTemporaryDir>
 
+#include <sys/statvfs.h>
+
+#include <functional>
 #include <memory>
+#include <optional>
 
 namespace TestSupport
 {
@@ -28,6 +32,24 @@ public:
 
 /// The C library's own version of a function that a test program replaces.
 void* nextSymbol(const char* name);
+
+/// What the programs with this fixture see of `statvfs`.
+struct SpaceCalls
+{
+    /// While it is above 0, the calls fail: a file system on a dying card.
+    static inline int failing = 0;
+    /// The answer in place of the truth.
+    static inline std::optional<struct statvfs> claimed;
+};
+
+/// What a store says of its file system, in bytes.
+struct Space
+{
+    qint64 capacity;
+    qint64 free;
+
+    template <typename Store> static Space of(const Store& store) { return {store.bytesCapacity(), store.bytesFree()}; }
+};
 
 /// A fresh directory for every test function, and what the tests of the stores do with it.
 class FileStoreFixture : public QObject
@@ -49,6 +71,10 @@ protected:
     /// Position of a file in that order.
     [[nodiscard]] unsigned int positionOf(const QString& name) const;
     [[nodiscard]] static QStringList oddNames();
+
+    /// Both for a store on `directory()`.
+    void checkThatSpaceIsTheFileSystems(const std::function<Space()>& space) const;
+    static void checkThatSpaceIsCountedInBlocksWithTheSuperusersReserve(const std::function<Space()>& space);
 
     /// Scans and waits for the end of it.
     static void scan(DataSource::AbstractFileStore& store);

@@ -12,11 +12,9 @@
 
 #include <dirent.h>
 #include <sys/stat.h>
-#include <sys/statvfs.h>
 #include <unistd.h>
 
 #include <atomic>
-#include <optional>
 #include <thread>
 
 using DataSource::AbstractFileStore;
@@ -24,6 +22,8 @@ using DataSource::FileStore;
 using TestSupport::FileStoreFixture;
 using TestSupport::loggedTexts;
 using TestSupport::PoolHold;
+using TestSupport::Space;
+using TestSupport::SpaceCalls;
 
 namespace
 {
@@ -60,6 +60,7 @@ private slots:
     void secondDeletionIsRefused();
     void stoppedScanReportsNothing();
     void stoppedScanStoresWhatItHasCounted();
+    void stoppedScanFillsTheCacheAnew();
     void scanAfterAStoppedOneReportsOnceAndCountsAll();
     void deletionAfterAStoppedScanHappensAfterIt();
     void stopWithoutAScanDoesNothing();
@@ -72,26 +73,6 @@ private slots:
     void fileInPlaceOfTheDirectoryIsAnEmptyStore();
     void directoryThatCannotBeMadeIsAnEmptyStore();
 };
-
-/// While it is above 0, `statvfs` fails: a file system on a dying card.
-static int failingSpaceCalls = 0;
-/// What `statvfs` answers instead of the truth.
-static std::optional<struct statvfs> claimedSpace;
-
-extern "C" int statvfs(const char* path, struct statvfs* status) noexcept
-{
-    using Function = int (*)(const char*, struct statvfs*);
-    static const auto real = reinterpret_cast<Function>(TestSupport::nextSymbol("statvfs"));
-    if (failingSpaceCalls > 0) {
-        --failingSpaceCalls;
-        errno = EIO;
-        return -1;
-    }
-    const int result = real(path, status);
-    if (claimedSpace)
-        *status = *claimedSpace;
-    return result;
-}
 
 /// While it is set, threads other than the test's own wait before they list a directory: a slow card.
 static std::atomic<bool> listingsAreSlow = false;
@@ -347,7 +328,21 @@ void FileStoreTest::stoppedScanStoresWhatItHasCounted()
     }
     QVERIFY(counted > 0);
     QVERIFY(counted < files);
-    QVERIFY(store.fileAt(0).exists());
+}
+
+void FileStoreTest::stoppedScanFillsTheCacheAnew()
+{
+    makeFiles(1, 1);
+    FileStore store(directory());
+    QVERIFY(QFile::rename(path("file 0"), path("renamed")));
+    QCOMPARE(store.fileAt(0).fileName(), "file 0");
+    {
+        const PoolHold hold;
+        store.rescan();
+        store.stopScanning();
+    }
+    settle();
+    QCOMPARE(store.fileAt(0).fileName(), "renamed");
 }
 
 void FileStoreTest::scanAfterAStoppedOneReportsOnceAndCountsAll()
@@ -409,38 +404,14 @@ void FileStoreTest::createFileNamesAFileAndCreatesNothing()
 
 void FileStoreTest::spaceIsTheFileSystems()
 {
-    FileStore store(directory());
-    struct statvfs status
-    {
-    };
-    QCOMPARE(::statvfs(qPrintable(directory()), &status), 0);
-    QCOMPARE(store.bytesCapacity(), static_cast<qint64>(status.f_bsize * status.f_blocks));
-    QVERIFY(store.bytesCapacity() > 0);
-    const qint64 before = store.bytesFree();
-    QFile file(path("used"));
-    QVERIFY(file.open(QIODevice::WriteOnly));
-    QCOMPARE(file.write(QByteArray(1 << 20, 'x')), 1 << 20);
-    file.close();
-    QVERIFY(before - store.bytesFree() >= 1 << 20);
+    const FileStore store(directory());
+    checkThatSpaceIsTheFileSystems([&] { return Space::of(store); });
 }
 
 void FileStoreTest::spaceIsCountedInBlocksWithTheSuperusersReserve()
 {
     const FileStore store(directory());
-    struct statvfs card
-    {
-    };
-    card.f_bsize = 4096;
-    card.f_frsize = 512;
-    card.f_blocks = 3'000'000'000;
-    card.f_bfree = 2'000'000'000;
-    card.f_bavail = 1'000'000'000;
-    claimedSpace = card;
-    const qint64 capacity = store.bytesCapacity();
-    const qint64 free = store.bytesFree();
-    claimedSpace.reset();
-    QCOMPARE(capacity, 12'288'000'000'000);
-    QCOMPARE(free, 8'192'000'000'000);
+    checkThatSpaceIsCountedInBlocksWithTheSuperusersReserve([&] { return Space::of(store); });
 }
 
 void FileStoreTest::vanishedDirectoryHasNoSpaceAndNoWarning()
@@ -457,10 +428,10 @@ void FileStoreTest::vanishedDirectoryHasNoSpaceAndNoWarning()
 void FileStoreTest::refusedSpaceIsLogged()
 {
     FileStore store(directory());
-    failingSpaceCalls = 1;
+    SpaceCalls::failing = 1;
     QCOMPARE(store.bytesFree(), 0);
     QCOMPARE(loggedTexts(log()), QStringList{warning(429, noInformation)});
-    failingSpaceCalls = 1;
+    SpaceCalls::failing = 1;
     QCOMPARE(store.bytesCapacity(), 0);
     QCOMPARE(loggedTexts(log()), QStringList{warning(457, noInformation)});
     QVERIFY(store.bytesCapacity() > 0);

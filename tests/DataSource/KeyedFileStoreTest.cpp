@@ -7,13 +7,11 @@
 
 #include <QTest>
 
-#include <sys/statvfs.h>
-
-#include <optional>
-
 using DataSource::KeyedFileStore;
 using TestSupport::FileStoreFixture;
 using TestSupport::loggedTexts;
+using TestSupport::Space;
+using TestSupport::SpaceCalls;
 
 class KeyedFileStoreTest : public FileStoreFixture
 {
@@ -38,26 +36,6 @@ private slots:
     void refusedSpaceIsLogged();
     void fileInPlaceOfTheDirectory();
 };
-
-/// While it is above 0, `statvfs` fails: a file system on a dying card.
-static int failingSpaceCalls = 0;
-/// What `statvfs` answers instead of the truth.
-static std::optional<struct statvfs> claimedSpace;
-
-extern "C" int statvfs(const char* path, struct statvfs* status) noexcept
-{
-    using Function = int (*)(const char*, struct statvfs*);
-    static const auto real = reinterpret_cast<Function>(TestSupport::nextSymbol("statvfs"));
-    if (failingSpaceCalls > 0) {
-        --failingSpaceCalls;
-        errno = EIO;
-        return -1;
-    }
-    const int result = real(path, status);
-    if (claimedSpace)
-        *status = *claimedSpace;
-    return result;
-}
 
 void KeyedFileStoreTest::storeOnAMissingDirectoryCreatesIt()
 {
@@ -171,37 +149,13 @@ void KeyedFileStoreTest::largeFilesAreSummedIn64Bits()
 void KeyedFileStoreTest::spaceIsTheFileSystems()
 {
     const KeyedFileStore store(directory());
-    struct statvfs status
-    {
-    };
-    QCOMPARE(::statvfs(qPrintable(directory()), &status), 0);
-    QCOMPARE(store.bytesCapacity(), static_cast<qint64>(status.f_bsize * status.f_blocks));
-    QVERIFY(store.bytesCapacity() > 0);
-    const qint64 before = store.bytesFree();
-    QFile file(path("used"));
-    QVERIFY(file.open(QIODevice::WriteOnly));
-    QCOMPARE(file.write(QByteArray(1 << 20, 'x')), 1 << 20);
-    file.close();
-    QVERIFY(before - store.bytesFree() >= 1 << 20);
+    checkThatSpaceIsTheFileSystems([&] { return Space::of(store); });
 }
 
 void KeyedFileStoreTest::spaceIsCountedInBlocksWithTheSuperusersReserve()
 {
     const KeyedFileStore store(directory());
-    struct statvfs card
-    {
-    };
-    card.f_bsize = 4096;
-    card.f_frsize = 512;
-    card.f_blocks = 3'000'000'000;
-    card.f_bfree = 2'000'000'000;
-    card.f_bavail = 1'000'000'000;
-    claimedSpace = card;
-    const qint64 capacity = store.bytesCapacity();
-    const qint64 free = store.bytesFree();
-    claimedSpace.reset();
-    QCOMPARE(capacity, 12'288'000'000'000);
-    QCOMPARE(free, 8'192'000'000'000);
+    checkThatSpaceIsCountedInBlocksWithTheSuperusersReserve([&] { return Space::of(store); });
 }
 
 void KeyedFileStoreTest::vanishedDirectoryIsEmptyAndLogsNothing()
@@ -219,10 +173,10 @@ void KeyedFileStoreTest::refusedSpaceIsLogged()
 {
     const KeyedFileStore store(directory());
     const QString text = "DataSource/src/KeyedFileStore.cpp, %1, Unable to obtain file system information";
-    failingSpaceCalls = 1;
+    SpaceCalls::failing = 1;
     QCOMPARE(store.bytesFree(), 0);
     QCOMPARE(loggedTexts(log()), QStringList{text.arg(159)});
-    failingSpaceCalls = 1;
+    SpaceCalls::failing = 1;
     QCOMPARE(store.bytesCapacity(), 0);
     QCOMPARE(loggedTexts(log()), QStringList{text.arg(186)});
 }
