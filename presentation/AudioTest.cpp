@@ -49,6 +49,8 @@ public:
 
 AudioTest::AudioTest(Domain::AbstractAudio& audio) : d(std::make_unique<PrivateData>(audio))
 {
+    // The default type may take a twentieth longer, and silence is to last a second at most.
+    d->timer.setTimerType(Qt::PreciseTimer);
     d->timer.start(checkInterval);
     qDebug("Audio file exists = %s", word(d->soundFile.exists()));
     qDebug("Attempting to open audio file.  Success = %s", word(d->soundFile.open(QIODevice::ReadOnly)));
