@@ -264,6 +264,8 @@ DSP_STATUS Link::closeQueue(MSGQ_Queue queue)
 DSP_STATUS Link::checkErrorHandler(MSGQ_Queue queue)
 {
     const std::lock_guard lock(mutex);
+    if (stage < Stage::Attached)
+        return DSP_EFAIL;
     return queue == MSGQ_INVALIDMSGQ || localQueue(queue) != nullptr ? DSP_SOK : DSP_EINVALIDARG;
 }
 
@@ -409,7 +411,8 @@ DSP_STATUS Link::takeMessage(LocalQueue& from, MSGQ_Msg* message)
     *message = reinterpret_cast<MSGQ_Msg>(buffer);
     (*message)->size = static_cast<Uint16>(first.size());
     from.messages.pop_front();
-    if (waitingMessages-- == maximumWaitingMessages)
+    // What a lost peer has left behind is fetched without a connection.
+    if (waitingMessages-- == maximumWaitingMessages && connection)
         connection->resumeReading();
     return DSP_SOK;
 }

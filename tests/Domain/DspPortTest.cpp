@@ -178,20 +178,19 @@ private slots:
             "DspPort: PROC_setup(NULL). Status = 0x80008008",
             "DspPort: PROC_attach(dspProcessorId, NULL). Status = 0x8000801b",
             "DspPort: POOL_open(this->privateData->applicationPoolId, &poolAttributes). Status = 0x80008000",
-            "DspPort: MSGQ_open(processorMessageQueueName, &this->privateData->processorMessageQueue, NULL). Status = "
-            "0x80008008",
+            "DspPort: MSGQ_open(processorMessageQueueName, &this->privateData->processorMessageQueue, NULL). "
+            "Status = 0x80008008",
+            "DspPort: MSGQ_setErrorHandler(this->privateData->processorMessageQueue, "
+            "this->privateData->applicationPoolId). Status = 0x80008008",
             "DspPort: PROC_load(dspProcessorId, this->privateData->dspExecutablePath.toAscii().data(), 0, NULL). "
-            "Status "
-            "= 0x8000800d",
+            "Status = 0x8000800d",
             "DspPort: PROC_start(dspProcessorId). Status = 0x8000800d",
             openTexts.at(0),
             "DspPort: MSGQ_transportOpen(dspProcessorId, &mqtAttrs). Status = 0x80008002",
-            "DspPort: MSGQ_locate(dspMessageQueueName, &this->privateData->dspMessageQueue, &syncLocateAttrs). Status "
-            "= "
-            "0x80008008",
+            "DspPort: MSGQ_locate(dspMessageQueueName, &this->privateData->dspMessageQueue, &syncLocateAttrs). "
+            "Status = 0x80008008",
             openTexts.at(1)};
         QStringList texts = sourcedTexts(*log);
-        // No queue is a valid target of error messages for the interface, so that call succeeds.
         QCOMPARE(texts, expected);
         QCOMPARE(port->write("x", 1), -1);
         QCOMPARE(sourcedTexts(*log), QStringList{"DspPort: MSGQ_alloc() failed. Status = 0x80008008"});
@@ -488,12 +487,12 @@ private slots:
         send(1);
         QCOMPARE(sourcedTexts(*log), warning);
         send(50);
-        for (int number = 0; number < 120; ++number) // leaves 31
+        for (int number = 0; number < 121; ++number) // leaves 30
             QCOMPARE(next().size(), 8);
-        send(1); // 32: still the same excursion
+        send(1); // 31: still the same excursion
         send(100);
         QCOMPARE(sourcedTexts(*log), QStringList());
-        for (int number = 0; number < 103; ++number) // leaves 29
+        for (int number = 0; number < 102; ++number) // leaves 29
             QCOMPARE(next().size(), 8);
         send(1); // 30: over
         send(70);
@@ -532,6 +531,27 @@ private slots:
         port.reset(); // closes
         QCOMPARE(peer->requestKinds().mid(16), closing);
         QCOMPARE(sourcedTexts(*log), QStringList());
+    }
+
+    void whatWasNotReadBeforeTheClosingIsForgotten()
+    {
+        openPort();
+        constexpr int unread = 101; // enough for the warning
+        for (int number = 0; number < unread; ++number)
+            QVERIFY(peer->sendMessage(message(dataType, 40)));
+        arrived(unread);
+        port->close();
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        (void)sourcedTexts(*log);
+        QCOMPARE(port->bytesAvailable(), 0);
+        QVERIFY(peer->sendMessage(message(dataType, 48)));
+        arrived(unread + 1);
+        QCOMPARE(next(), message(dataType, 48));
+        QCOMPARE(port->bytesAvailable(), 0);
+        for (int number = 0; number < unread; ++number)
+            QVERIFY(peer->sendMessage(message(dataType, 40)));
+        arrived(2 * unread + 1);
+        QCOMPARE(sourcedTexts(*log), QStringList{"DspPort: DSP data buffer too large"});
     }
 
     void closingAtOnceAfterOpeningEnds()

@@ -21,6 +21,7 @@ private slots:
         QCOMPARE(bits(PROC_attach(0, nullptr)), 0x8000801BU);
         QCOMPARE(bits(POOL_open(0, &pool)), 0x80008000U);
         QCOMPARE(bits(openQueue(hostName, &hostQueue)), 0x80008008U);
+        QCOMPARE(bits(MSGQ_setErrorHandler(MSGQ_INVALIDMSGQ, 0)), 0x80008008U);
         QCOMPARE(bits(PROC_load(0, imagePath, 0, nullptr)), 0x8000800DU);
         QCOMPARE(bits(PROC_start(0)), 0x8000800DU);
         QCOMPARE(bits(MSGQ_transportOpen(0, &transport)), 0x80008002U);
@@ -39,6 +40,7 @@ private slots:
         QCOMPARE(bits(PROC_setup(nullptr)), 0x8000U);
         QCOMPARE(bits(POOL_open(0, &pool)), 0x80008000U);
         QCOMPARE(bits(openQueue(hostName, &hostQueue)), 0x80008008U);
+        QCOMPARE(bits(MSGQ_setErrorHandler(MSGQ_INVALIDMSGQ, 0)), 0x80008008U);
         QCOMPARE(bits(PROC_load(0, imagePath, 0, nullptr)), 0x80008002U);
         QCOMPARE(bits(PROC_start(0)), 0x80008002U);
         QCOMPARE(bits(PROC_stop(0)), 0x80008002U);
@@ -176,6 +178,7 @@ private slots:
                                         MSGQ_get(0x0003, WAIT_NONE, &message)})
             QCOMPARE(bits(status), 0x8000800BU);
         QCOMPARE(bits(MSGQ_setErrorHandler(hostQueue, 0)), 0x8000U);
+        QCOMPARE(bits(MSGQ_setErrorHandler(MSGQ_INVALIDMSGQ, 0)), 0x8000U); // no queue any more
     }
 
     void queueNamesAreUniqueAndQueuesFinite()

@@ -214,6 +214,22 @@ private slots:
         openAll();
     }
 
+    void aFullQueueIsFetchedEvenWhenNobodyServesTheDriverAnyMore()
+    {
+        constexpr int kept = 1024; // all that the library holds
+        openAll();
+        for (quint32 number = 0; number < kept; ++number)
+            QVERIFY(peer->sendMessage(DspPeer::words({number})));
+        peer->hangUp();
+        QTRY_COMPARE(bits(PROC_attach(0, nullptr)), 0x8000801BU);
+        peer.reset();
+        QCOMPARE(bits(PROC_setup(nullptr)), 0x80008008U);
+        for (quint32 number = 0; number < kept; ++number)
+            QCOMPARE(fetched(), DspPeer::words({number}));
+        MSGQ_Msg message = nullptr;
+        QCOMPARE(bits(MSGQ_get(hostQueue, WAIT_FOREVER, &message)), 0x80008008U);
+    }
+
     void aWaitEndsWhenThePeerIsLost()
     {
         openAll();

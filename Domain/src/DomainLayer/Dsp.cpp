@@ -317,12 +317,15 @@ bool Dsp::PrivateData::awaitResponse(DspCommand command)
 {
     int received = NoResponse;
     {
-        // The answer may be here already; a wake-up without one is none, and does not start the time anew.
+        // The answer may be here already; a wake-up without one is none, and does not start the time anew. Once the
+        // time is over no answer counts any more.
         const QDeadlineTimer deadline(acknowledgementTimeout);
         const QMutexLocker waiting(&responseMutex);
-        while (response == NoResponse && waitUnlocked(responseCondition, responseMutex, deadline)) {
-        }
-        received = response;
+        bool inTime = true;
+        while (inTime && response == NoResponse)
+            inTime = waitUnlocked(responseCondition, responseMutex, deadline);
+        if (inTime)
+            received = response;
     }
     if (received == AckResponse)
         return true;

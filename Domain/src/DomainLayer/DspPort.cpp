@@ -3,6 +3,7 @@
 
 #include "Domain/src/DomainLayer/DspPort.h"
 
+#include "Domain/src/DomainLayer/DspCommand.h"
 #include "utilities/Debug.h"
 
 #include <QCoreApplication>
@@ -53,7 +54,6 @@ constexpr qint64 wordsSize = 8;
 
 constexpr Uint16 outgoingMessageId = 0x41;
 constexpr Uint16 incomingMessageId = 100;
-constexpr quint32 acknowledgementType = 0x1100B;
 
 constexpr int getTimeout = 500;        // ms
 constexpr int threadEndTimeout = 5000; // ms
@@ -210,6 +210,12 @@ bool DspPort::PrivateData::startReading()
     if (!readThread.wait(0))
         return false;
     stopRequest.tryAcquire(stopRequest.available());
+    {
+        // A reader fetches one message for each announcement: with those of the time before it would stay behind.
+        const QMutexLocker locker(&lock);
+        receiveList.clear();
+        receiveListFull = false;
+    }
     keepRunning = true;
     readLoopFinished = false;
     readThread.start(QThread::HighPriority);
@@ -342,7 +348,7 @@ void DspPort::PrivateData::store(const QByteArray& data)
     bool overflowing = false;
     {
         const QMutexLocker locker(&lock);
-        if (wordAt(data.constData(), data.size(), 0) == acknowledgementType)
+        if (wordAt(data.constData(), data.size(), 0) == MessageAck)
             receiveList.prepend(data);
         else
             receiveList.append(data);

@@ -33,7 +33,8 @@ namespace Domain
 ///
 /// Errors: a DSPLink call that fails while opening is logged as fatal and the sequence goes on, so the port is open
 /// whatever the DSP says; without a DSP every write then fails (-1, logged) and nothing ever arrives. Locating
-/// the DSP's queue waits as long as running firmware takes to make it.
+/// the DSP's queue waits as long as running firmware takes to make it. What has not been read when the port closes is
+/// forgotten when it opens again.
 class DspPort : public QIODevice
 {
     Q_OBJECT
