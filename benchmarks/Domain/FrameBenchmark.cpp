@@ -73,6 +73,7 @@ public:
     }
     void rewind() { position = offered = 0; }
     [[nodiscard]] bool isSequential() const override { return true; }
+    [[nodiscard]] qint64 bytesAvailable() const override { return left + QIODevice::bytesAvailable(); }
     bool open(OpenMode mode) override { return QIODevice::open(mode | Unbuffered); }
 
 protected:
@@ -111,9 +112,9 @@ void parserAlone(benchmark::State& state, Content content, qsizetype size, qsize
     for ([[maybe_unused]] auto iteration : state) {
         for (qsizetype done = 0; done < stream.size(); done += read) {
             parser.append(QByteArrayView(stream).sliced(done, std::min(read, stream.size() - done)));
-            for (auto outcome = parser.advance(); outcome != FrameParser::Outcome::NeedsMoreBytes;
-                 outcome = parser.advance())
+            parser.parse([&](FrameParser::Outcome outcome, QByteArrayView /*payload*/) {
                 frames += outcome == FrameParser::Outcome::FrameReceived;
+            });
         }
     }
     report(state, stream, frames);

@@ -20,11 +20,10 @@ QList<QByteArray> payloadsIn(const QByteArray& stream, qsizetype pieceLength)
     FrameParser parser;
     for (qsizetype done = 0; done < stream.size(); done += pieceLength) {
         parser.append(QByteArrayView(stream).sliced(done, std::min(pieceLength, stream.size() - done)));
-        for (auto outcome = parser.advance(); outcome != FrameParser::Outcome::NeedsMoreBytes;
-             outcome = parser.advance()) {
+        parser.parse([&](FrameParser::Outcome outcome, QByteArrayView payload) {
             if (outcome == FrameParser::Outcome::FrameReceived)
-                payloads.append(parser.payload().toByteArray());
-        }
+                payloads.append(payload.toByteArray());
+        });
     }
     return payloads;
 }

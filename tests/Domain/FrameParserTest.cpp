@@ -27,12 +27,12 @@ struct Parsed
 void parse(FrameParser& parser, const QByteArray& bytes, Parsed& parsed)
 {
     parser.append(bytes);
-    for (auto outcome = parser.advance(); outcome != FrameParser::Outcome::NeedsMoreBytes; outcome = parser.advance()) {
+    parser.parse([&](FrameParser::Outcome outcome, QByteArrayView payload) {
         if (outcome == FrameParser::Outcome::FrameReceived)
-            parsed.payloads.append(parser.payload().toByteArray());
+            parsed.payloads.append(payload.toByteArray());
         else
             ++parsed.refusals;
-    }
+    });
 }
 
 QList<QByteArray> payloadsIn(const QByteArray& bytes)
@@ -71,7 +71,11 @@ private slots:
     void aFrameAfterATruncatedOneIsFound();
     void aFrameInsideTheClaimOfAFalseHeaderIsFound();
     void aFrameAtTheVeryEndOfAReadOfAnySizeIsFound();
+    void framesAcrossReadsLongerThanTheStorageAreFound();
+    void aVisitorMayAppendAndParse();
     void everyRefusalIsReportedOnceAByte();
+    void theSumOfTheFirstBytesLeavesOutThoseBehind_data();
+    void theSumOfTheFirstBytesLeavesOutThoseBehind();
     void anIntactFrameIsNeverLostToDamageElsewhere_data();
     void anIntactFrameIsNeverLostToDamageElsewhere();
 };
@@ -194,7 +198,7 @@ void FrameParserTest::aFrameInsideTheClaimOfAFalseHeaderIsFound()
 
 void FrameParserTest::aFrameAtTheVeryEndOfAReadOfAnySizeIsFound()
 {
-    constexpr int storage = 64 * 1024;
+    constexpr int storage = 16 * 1024;
     const QByteArray frame = frameOf("last");
     FrameParser parser;
     // Ends that lie before, at and behind the end of what the parser keeps at hand, with old bytes behind them or none.
@@ -206,6 +210,51 @@ void FrameParserTest::aFrameAtTheVeryEndOfAReadOfAnySizeIsFound()
     }
 }
 
+void FrameParserTest::framesAcrossReadsLongerThanTheStorageAreFound()
+{
+    Generator generator(17);
+    FrameParser parser;
+    for (const int size : {300'000, 46, 16 * 1024, 1'000'000, 1, 20'000}) {
+        // Pieces pile up unparsed.
+        const auto payloads = TestSupport::randomPayloads(generator, 3000);
+        QByteArray stream;
+        for (const auto& payload : payloads)
+            stream += frameOf(payload);
+        const QByteArray allButTheEnd = stream.chopped(1);
+        for (qsizetype done = 0; done < allButTheEnd.size(); done += size)
+            parser.append(allButTheEnd.mid(done, size));
+        Parsed parsed;
+        parse(parser, {}, parsed);
+        QCOMPARE(parsed.payloads.size(), payloads.size() - 1);
+        parse(parser, stream.last(1), parsed);
+        QVERIFY(parsed.payloads == payloads);
+        QCOMPARE(parsed.refusals, 0);
+    }
+}
+
+void FrameParserTest::aVisitorMayAppendAndParse()
+{
+    QByteArray rest;
+    QList<QByteArray> expected{"one", "two"};
+    for (int number = 0; number < 1000; ++number) {
+        expected.append(QByteArray::number(number));
+        rest += frameOf(expected.last());
+    }
+    FrameParser parser;
+    QList<QByteArray> received;
+    const auto take = [&](FrameParser::Outcome /*outcome*/, QByteArrayView payload) {
+        received.append(payload.toByteArray());
+    };
+    parser.append(frameOf("one") + frameOf("two").chopped(1));
+    parser.parse([&](FrameParser::Outcome outcome, QByteArrayView payload) {
+        take(outcome, payload);
+        // More than the storage holds, so that it moves.
+        parser.append("\n" + rest);
+        parser.parse(take);
+    });
+    QVERIFY(received == expected);
+}
+
 void FrameParserTest::everyRefusalIsReportedOnceAByte()
 {
     FrameParser parser;
@@ -215,6 +264,28 @@ void FrameParserTest::everyRefusalIsReportedOnceAByte()
     QCOMPARE(parsed.refusals, 94);
     parse(parser, silence, parsed);
     QCOMPARE(parsed.refusals, 100);
+}
+
+void FrameParserTest::theSumOfTheFirstBytesLeavesOutThoseBehind_data()
+{
+    QTest::addColumn<QByteArray>("bytes");
+    Generator generator(18);
+    QTest::addRow("largest") << QByteArray(Domain::FrameChecksum::summedBytes, '\xFF');
+    QTest::addRow("random") << TestSupport::randomBytes(generator, Domain::FrameChecksum::summedBytes);
+    QTest::addRow("one bit each") << QByteArray(Domain::FrameChecksum::summedBytes, '\x01');
+}
+
+void FrameParserTest::theSumOfTheFirstBytesLeavesOutThoseBehind()
+{
+    QFETCH(const QByteArray, bytes);
+    quint16 expected = 0;
+    for (quint16 length = 0; length <= bytes.size(); ++length) {
+        QCOMPARE(Domain::FrameChecksum::ofFirst(length, bytes.constData()), expected);
+        QCOMPARE(Domain::FrameChecksum::ofFirstInLanes(length, bytes.constData()), expected);
+        QCOMPARE(Domain::Frame::checksumOf(bytes.first(length)), expected);
+        if (length < bytes.size())
+            expected = static_cast<quint16>(expected + static_cast<uchar>(bytes.at(length)));
+    }
 }
 
 void FrameParserTest::anIntactFrameIsNeverLostToDamageElsewhere_data()
@@ -232,7 +303,7 @@ void FrameParserTest::anIntactFrameIsNeverLostToDamageElsewhere()
 {
     QFETCH(const unsigned, seed);
     QFETCH(const DamageRates, rates);
-    constexpr int batches = 60;
+    constexpr int batches = 300;
     constexpr int framesEach = 1000;
     Generator generator(seed);
     FrameParser parser;

@@ -82,6 +82,34 @@ protected:
     }
 };
 
+/// Gives what it has in pieces, and may be filled again while it is read.
+class PieceDevice : public QIODevice
+{
+public:
+    [[nodiscard]] bool isSequential() const override { return true; }
+    [[nodiscard]] qint64 bytesAvailable() const override
+    {
+        return (tellsItsSize ? bytes.size() : 0) + QIODevice::bytesAvailable();
+    }
+    bool open(OpenMode mode) override { return QIODevice::open(mode | Unbuffered); }
+
+    QByteArray bytes;
+    QByteArray refill; ///< added after every piece
+    qint64 longestPiece = 30;
+    bool tellsItsSize = true;
+
+protected:
+    qint64 readData(char* destination, qint64 maximum) override
+    {
+        const auto count = std::min({maximum, longestPiece, static_cast<qint64>(bytes.size())});
+        std::copy_n(bytes.constData(), count, destination);
+        bytes.remove(0, count);
+        bytes += refill;
+        return count;
+    }
+    qint64 writeData(const char* /*source*/, qint64 count) override { return count; }
+};
+
 void makeResetFile()
 {
     QDir().mkpath(resetFolder);
@@ -141,6 +169,11 @@ private slots:
     void randomFramesAmongGarbageArriveOverTheLine();
     void livesOnAnotherThreadThanThePort();
     void aMessageHandlerMayParseAgain();
+    void aKeptMessageStaysAsItWas();
+    void everyReceiverGetsTheMessageEvenIfOneParsesOn();
+    void aDeviceIsReadUntilItIsEmpty_data();
+    void aDeviceIsReadUntilItIsEmpty();
+    void aFloodedLineDoesNotHoldTheThread();
 
 private:
     std::unique_ptr<LogCapture> log;
@@ -479,6 +512,78 @@ void SerialProtocolTest::aMessageHandlerMayParseAgain()
     QVERIFY(link.receives(3));
     QVERIFY(link.settles());
     QCOMPARE(link.messages, (QList<QByteArray>{"one", "two", "three"}));
+}
+
+/// A receiver on another thread, for example, looks at a message only later.
+void SerialProtocolTest::aKeptMessageStaysAsItWas()
+{
+    Generator generator(32);
+    const auto payloads = TestSupport::randomPayloads(generator, 50);
+    Link link;
+    QSignalSpy spy(&link.protocol, &SerialProtocol::messageReceived);
+    for (const auto& payload : payloads)
+        link.pty.write(frameOf(payload));
+    QVERIFY(link.receives(payloads.size()));
+    QVERIFY(link.messages == payloads);
+    for (qsizetype index = 0; index < payloads.size(); ++index)
+        QCOMPARE(spy.at(index).front().toByteArray(), payloads.at(index));
+}
+
+void SerialProtocolTest::everyReceiverGetsTheMessageEvenIfOneParsesOn()
+{
+    PieceDevice device;
+    SerialProtocol protocol(device);
+    connect(&protocol, &SerialProtocol::messageReceived, this, [&] { protocol.processData(); });
+    QSignalSpy spy(&protocol, &SerialProtocol::messageReceived);
+    device.bytes = frameOf("one") + frameOf("two");
+    device.longestPiece = frameOf("one").size();
+    protocol.processData();
+    // The second receiver gets what the first one's parsing brings before it gets what the first one got.
+    QCOMPARE(spy.count(), 2);
+    QCOMPARE(spy.at(0).front().toByteArray(), QByteArray("two"));
+    QCOMPARE(spy.at(1).front().toByteArray(), QByteArray("one"));
+}
+
+void SerialProtocolTest::aDeviceIsReadUntilItIsEmpty_data()
+{
+    QTest::addColumn<bool>("tellsItsSize");
+    QTest::addRow("size known") << true;
+    QTest::addRow("size unknown") << false;
+}
+
+void SerialProtocolTest::aDeviceIsReadUntilItIsEmpty()
+{
+    QFETCH(const bool, tellsItsSize);
+    PieceDevice device;
+    device.tellsItsSize = tellsItsSize;
+    SerialProtocol protocol(device);
+    QSignalSpy spy(&protocol, &SerialProtocol::messageReceived);
+    Generator generator(33);
+    const auto payloads = TestSupport::randomPayloads(generator, 300);
+    for (const auto& payload : payloads)
+        device.bytes += frameOf(payload);
+    protocol.processData();
+    QCOMPARE(device.bytes.size(), 0);
+    QCOMPARE(spy.count(), payloads.size());
+    for (qsizetype index = 0; index < payloads.size(); ++index)
+        QCOMPARE(spy.at(index).front().toByteArray(), payloads.at(index));
+}
+
+/// What comes while the line is read is left for its own announcement: the thread has other events, too.
+void SerialProtocolTest::aFloodedLineDoesNotHoldTheThread()
+{
+    PieceDevice device;
+    SerialProtocol protocol(device);
+    QSignalSpy spy(&protocol, &SerialProtocol::messageReceived);
+    const QByteArray frame = frameOf(QByteArray(22, 'x'));
+    device.bytes = frame + frame;
+    device.refill = frame;
+    protocol.processData();
+    QCOMPARE(spy.count(), 2);
+    device.refill.clear();
+    protocol.processData();
+    QCOMPARE(spy.count(), 4);
+    QCOMPARE(device.bytes.size(), 0);
 }
 
 QTEST_GUILESS_MAIN(SerialProtocolTest)

@@ -220,13 +220,14 @@ bool BeaconProcessor::PrivateData::transmit(const QByteArray& message)
 unsigned BeaconProcessor::PrivateData::startAckTimer()
 {
     const auto attempt = ++attempts;
-    QMetaObject::invokeMethod(ackTimer.get(), "start", Q_ARG(int, ackTimeoutMs));
+    // Not by the slot's name: looking that up takes a good part of a ping's time.
+    QMetaObject::invokeMethod(ackTimer.get(), [this] { ackTimer->start(ackTimeoutMs); });
     return attempt;
 }
 
 void BeaconProcessor::PrivateData::stopAckTimer()
 {
-    QMetaObject::invokeMethod(ackTimer.get(), "stop");
+    QMetaObject::invokeMethod(ackTimer.get(), &QTimer::stop);
 }
 
 /// By the time that a caller's failure comes to the worker thread, the timer may guard a command sent meanwhile, which

@@ -3,8 +3,12 @@
 
 #pragma once
 
-#include <QByteArrayView>
+#include "Domain/src/DomainLayer/FrameChecksum.h"
 
+#include <QByteArrayView>
+#include <QtEndian>
+
+#include <cstring>
 #include <vector>
 
 namespace Domain
@@ -35,6 +39,11 @@ constexpr qsizetype longestPayload = 100;
 /// The 16-bit sum of the bytes, each taken as unsigned.
 [[nodiscard]] quint16 checksumOf(QByteArrayView bytes);
 
+[[nodiscard]] inline quint16 fieldAt(const char* bytes)
+{
+    return qFromBigEndian<quint16>(bytes);
+}
+
 } // namespace Frame
 
 /// Finds whole, checked frames in a byte stream that may be damaged anywhere.
@@ -43,8 +52,8 @@ constexpr qsizetype longestPayload = 100;
 ///
 /// After every refusal the search goes on one byte behind the refused start byte, so no damage hides an intact frame
 /// behind it. A partial frame waits for its rest without limit of time.
-/// Cost: linear in the bytes appended, however they are divided. Memory: 64 KiB, or for as long as it takes to parse
-/// it, a longer `append`.
+/// Cost: linear in the bytes appended, however they are divided. Memory: 16 KiB, or for as long as it takes to parse
+/// them, what longer `append`s need.
 class FrameParser
 {
 public:
@@ -58,27 +67,108 @@ public:
         MissingEndOfPacket
     };
 
+    FrameParser();
+    FrameParser(const FrameParser&) = delete;
+    FrameParser& operator=(const FrameParser&) = delete;
+
     void append(QByteArrayView bytes);
 
-    /// Goes on to the next frame or refusal. `payload` holds the frame's payload until the next `append` or `advance`.
-    [[nodiscard]] Outcome advance() { return end < wanted ? Outcome::NeedsMoreBytes : parse(); }
-    [[nodiscard]] QByteArrayView payload() const { return receivedPayload; }
+    /// Calls `visit(Outcome, QByteArrayView payload)` for every frame and every refusal, in their order, until more
+    /// bytes are needed, which is not told. The payload, empty for a refusal, is valid until the next `append`. The
+    /// visitor may append and parse.
+    template <typename Visitor> void parse(Visitor&& visit);
 
 private:
-    [[nodiscard]] qsizetype capacity() const { return static_cast<qsizetype>(buffer.size()); }
-    void makeRoom(qsizetype size);
-    [[nodiscard]] bool findStartByte();
-    [[nodiscard]] Outcome parse();
-    [[nodiscard]] Outcome parsePayload(quint16 length);
-    [[nodiscard]] Outcome waitFor(qsizetype frameBytes);
-    [[nodiscard]] Outcome refuse(Outcome reason);
+    /// Room for many reads, so that what is left of one is seldom moved to the front; little enough to stay in the
+    /// cache.
+    static constexpr qsizetype usualCapacity = 16 * 1024;
 
-    std::vector<char> buffer; ///< storage; `position` to `end` are filled and not yet parsed
-    qsizetype position = 0;
-    qsizetype end = 0;
-    qsizetype room = 0;   ///< what can be appended as it is
-    qsizetype wanted = 1; ///< the `end` from which on there is something to do
-    QByteArrayView receivedPayload;
+    void makeRoom(qsizetype size);
+    void shrink();
+    void moveTo(qsizetype capacity);
+    [[nodiscard]] static char* startByteIn(char* from, char* stop);
+    [[nodiscard]] static Outcome judge(const char* frame, quint16 length, const char* stop);
+
+    std::vector<char> buffer; ///< `position` to `end` is received and not yet parsed
+    char* position = nullptr;
+    char* end = nullptr;
+    char* limit = nullptr;  ///< of what can be appended as it is; behind it is what the summing of a payload may read
+    char* wanted = nullptr; ///< the `end` from which on there is something to do
 };
+
+inline void FrameParser::append(QByteArrayView bytes)
+{
+    constexpr qsizetype block = 16;
+    const auto size = bytes.size();
+    if (limit - end < size)
+        makeRoom(size);
+    // What one read of the line brings is too little to be worth a call. The last block overlaps the one before it.
+    if (size >= block && size <= 4 * block) {
+        for (qsizetype offset = 0; offset + block <= size; offset += block)
+            std::memcpy(end + offset, bytes.data() + offset, block);
+        std::memcpy(end + size - block, bytes.data() + size - block, block);
+    } else if (size > 0) {
+        std::memcpy(end, bytes.data(), static_cast<std::size_t>(size));
+    }
+    end += size;
+}
+
+inline char* FrameParser::startByteIn(char* from, char* stop)
+{
+    void* const found = std::memchr(from, Frame::startByte, static_cast<std::size_t>(stop - from));
+    return found == nullptr ? stop : static_cast<char*>(found);
+}
+
+/// Of a header that is there and the frame of that length.
+inline FrameParser::Outcome FrameParser::judge(const char* frame, quint16 length, const char* stop)
+{
+    const auto* const header = reinterpret_cast<const uchar*>(frame);
+    const char* const payload = frame + Frame::headerSize;
+    if (header[0] + header[1] + header[2] + header[3] + header[4] !=
+        Frame::fieldAt(frame + Frame::headerChecksumOffset)) [[unlikely]]
+        return Outcome::InvalidHeaderChecksum;
+    if (length > Frame::longestPayload) [[unlikely]]
+        return Outcome::PayloadTooLong;
+    if (stop <= payload + length)
+        return Outcome::NeedsMoreBytes;
+    if (FrameChecksum::ofFirst(length, payload) != Frame::fieldAt(frame + Frame::dataChecksumOffset)) [[unlikely]]
+        return Outcome::InvalidDataChecksum;
+    if (payload[length] != Frame::endOfPacket) [[unlikely]]
+        return Outcome::MissingEndOfPacket;
+    return Outcome::FrameReceived;
+}
+
+template <typename Visitor> void FrameParser::parse(Visitor&& visit)
+{
+    // The visitor may change the members; between its calls they are worth keeping at hand.
+    char* at = position;
+    char* stop = end;
+    char* need = wanted;
+    while (need <= stop) {
+        if (*at != Frame::startByte) [[unlikely]] {
+            at = startByteIn(at, stop);
+            need = at + Frame::headerSize;
+            continue;
+        }
+        const auto length = Frame::fieldAt(at + Frame::lengthOffset);
+        const auto outcome = judge(at, length, stop);
+        if (outcome == Outcome::NeedsMoreBytes) {
+            need = at + length + Frame::overhead;
+            break;
+        }
+        const bool good = outcome == Outcome::FrameReceived;
+        const QByteArrayView payload(at + Frame::headerSize, good ? length : 0);
+        position = at + (good ? length + Frame::overhead : 1);
+        wanted = position + Frame::headerSize;
+        visit(outcome, payload);
+        at = position;
+        stop = end;
+        need = wanted;
+    }
+    position = at;
+    wanted = need;
+    if (buffer.size() > usualCapacity) [[unlikely]]
+        shrink();
+}
 
 } // namespace Domain

@@ -9,6 +9,10 @@
 #include <QFile>
 #include <QtEndian>
 
+#include <algorithm>
+#include <array>
+#include <utility>
+
 namespace Domain
 {
 
@@ -17,6 +21,7 @@ namespace
 
 const QString resetFileName = QStringLiteral("/sys/class/misc/msp430/reset");
 constexpr char resetCommand = '1';
+constexpr qsizetype chunkSize = 4096;
 
 /// No allocation: on a noisy line this is called for every byte.
 void warn(int line, const QString& text)
@@ -83,9 +88,24 @@ QByteArray framed(const QByteArray& payload)
 class SerialProtocol::PrivateData
 {
 public:
+    [[nodiscard]] QByteArray messageOf(QByteArrayView payload);
+
     QIODevice& device;
     FrameParser parser{};
+    QByteArray lastMessage{}; ///< null while its receivers look at it
 };
+
+/// Most receivers look at a message and let it go: then its memory serves for the next one. From one that is still kept
+/// somewhere, the resizing detaches.
+QByteArray SerialProtocol::PrivateData::messageOf(QByteArrayView payload)
+{
+    QByteArray message = std::exchange(lastMessage, {});
+    if (message.isNull())
+        message.reserve(Frame::longestPayload);
+    message.resize(payload.size());
+    std::copy(payload.begin(), payload.end(), message.data());
+    return message;
+}
 
 SerialProtocol::SerialProtocol(QIODevice& device) : data(new PrivateData{device})
 {
@@ -107,16 +127,32 @@ bool SerialProtocol::sendMessage(const QByteArray& payload)
     return false;
 }
 
+/// Takes what is there now and no more: what comes meanwhile has an announcement of its own, and a line that is flooded
+/// must not keep the thread from its other events.
 void SerialProtocol::processData()
 {
-    data->parser.append(data->device.readAll());
-    for (auto outcome = data->parser.advance(); outcome != FrameParser::Outcome::NeedsMoreBytes;
-         outcome = data->parser.advance()) {
-        if (outcome == FrameParser::Outcome::FrameReceived)
-            emit messageReceived(data->parser.payload().toByteArray());
-        else
-            warnOfRefusal(outcome);
-    }
+    std::array<char, chunkSize> chunk; // NOLINT(cppcoreguidelines-pro-type-member-init): written by read
+    const auto announced = data->device.bytesAvailable();
+    qint64 done = 0;
+    qint64 count = 0;
+    do {
+        count = data->device.read(chunk.data(), chunkSize);
+        if (count > 0)
+            parse({chunk.data(), static_cast<qsizetype>(count)});
+        done += count;
+    } while (count > 0 && (announced == 0 || done < announced));
+}
+
+void SerialProtocol::parse(QByteArrayView bytes)
+{
+    data->parser.append(bytes);
+    data->parser.parse([this](FrameParser::Outcome outcome, QByteArrayView payload) {
+        if (outcome != FrameParser::Outcome::FrameReceived)
+            return warnOfRefusal(outcome);
+        QByteArray message = data->messageOf(payload);
+        emit messageReceived(message);
+        data->lastMessage = std::move(message);
+    });
 }
 
 } // namespace Domain

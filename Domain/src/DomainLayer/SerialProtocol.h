@@ -38,10 +38,12 @@ public slots:
 
 signals:
     /// A verified payload, without header and end byte.
-    void messageReceived(QByteArray message);
+    void messageReceived(const QByteArray& message);
 
 private:
     class PrivateData;
+
+    void parse(QByteArrayView bytes);
 
     std::unique_ptr<PrivateData> data;
 };
