@@ -1,9 +1,9 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
-#include "Domain/src/DomainLayer/AbstractButtons.h"
 #include "Domain/src/DomainLayer/Dsp.h"
 #include "Domain/src/DomainLayer/DspPort.h"
+#include "tests/support/AssertionLine.h"
 
 #include <QCoreApplication>
 #include <QFile>
@@ -118,13 +118,6 @@ private:
     std::thread partner;
 };
 
-class NoButtons : public Domain::AbstractButtons
-{
-public:
-    bool buttonsLocked() override { return false; }
-    void setButtonLock(bool /*locked*/) override {}
-};
-
 /// The DSP that acknowledges everything at once.
 struct Bench
 {
@@ -138,7 +131,7 @@ struct Bench
         peer.acknowledgeAll();
     }
 #endif
-    NoButtons buttons;
+    TestSupport::AssertionLine buttons;
     Domain::DspPort port{QStringLiteral("/dsp.out")};
 };
 

@@ -1,11 +1,11 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
-#include "Domain/src/DomainLayer/AbstractButtons.h"
 #include "Domain/src/DomainLayer/Dsp.h"
 #include "Domain/src/DomainLayer/DspPort.h"
 #include "Domain/src/DomainLayer/WirelessSensorReading.h"
 #include "benchmarks/Domain/AllocationCount.h"
+#include "tests/support/AssertionLine.h"
 #include "tests/support/InstantDsp.h"
 
 #include <QCoreApplication>
@@ -137,13 +137,6 @@ void decoding(benchmark::State& state)
     state.counters["plain_allocations"] = allocationsOf(copy);
 }
 
-class NoButtons : public Domain::AbstractButtons
-{
-public:
-    bool buttonsLocked() override { return false; }
-    void setButtonLock(bool /*locked*/) override {}
-};
-
 QByteArray littleEndian(std::uint32_t word)
 {
     QByteArray bytes(4, '\0');
@@ -160,7 +153,7 @@ void receiving(benchmark::State& state)
     const QByteArray data = messageFor(1);
     const QByteArray message =
         littleEndian(sensorDataType) + littleEndian(static_cast<std::uint32_t>(data.size())) + data;
-    NoButtons buttons;
+    TestSupport::AssertionLine buttons;
     Domain::DspPort port(QStringLiteral("/dsp.out"));
     Domain::Dsp dsp(port, buttons);
     QSemaphore received;

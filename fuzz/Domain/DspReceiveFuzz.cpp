@@ -1,9 +1,9 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
-#include "Domain/src/DomainLayer/AbstractButtons.h"
 #include "Domain/src/DomainLayer/Dsp.h"
 #include "Domain/src/DomainLayer/DspPort.h"
+#include "tests/support/AssertionLine.h"
 #include "tests/support/InstantDsp.h"
 
 #include <QCoreApplication>
@@ -17,13 +17,6 @@
 
 namespace
 {
-
-class NoButtons : public Domain::AbstractButtons
-{
-public:
-    bool buttonsLocked() override { return false; }
-    void setButtonLock(bool /*locked*/) override {}
-};
 
 /// The whole receiving side: port, read thread, worker.
 class Receiver
@@ -60,7 +53,7 @@ public:
     }
 
 private:
-    NoButtons buttons;
+    TestSupport::AssertionLine buttons;
     Domain::DspPort port{QStringLiteral("/dsp.out")};
     Domain::Dsp dsp;
     std::atomic<qint32> round = 0;

@@ -50,6 +50,28 @@ private:
     QStringList seen;
 };
 
+/// What happens to windows other than `known`, and whether the keyboard was grabbed by then.
+class WindowWatcher : public QObject
+{
+public:
+    explicit WindowWatcher(QWidget* known) : except(known) { qApp->installEventFilter(this); }
+
+    QStringList seen;
+
+protected:
+    bool eventFilter(QObject* object, QEvent* event) override
+    {
+        const bool shown = event->type() == QEvent::Show;
+        if ((shown || event->type() == QEvent::Hide) && object->isWidgetType() && object != except)
+            seen.append(QStringLiteral("%1, %2").arg(shown ? "show" : "hide",
+                                                     QWidget::keyboardGrabber() == nullptr ? "no grab" : "grabbed"));
+        return false;
+    }
+
+private:
+    QWidget* except;
+};
+
 } // namespace
 
 class ButtonsTest : public QObject
@@ -65,6 +87,7 @@ private slots:
     void keysEmitTheirSignals();
     void keysReachTheButtonsWhateverHasTheFocus();
     void theInvisibleWindowStaysHidden();
+    void theInvisibleWindowIsShownThenHiddenThenGrabs();
     void destructionReleasesTheKeyboard();
     void heldDownKeyRepeats();
     void powerFiresOnTheThirdRepeatOnly();
@@ -186,6 +209,16 @@ void ButtonsTest::theInvisibleWindowStaysHidden()
     QVERIFY(QWidget::keyboardGrabber() != nullptr);
     QVERIFY(QWidget::keyboardGrabber()->isHidden());
     QVERIFY(QWidget::keyboardGrabber()->isWindow());
+}
+
+void ButtonsTest::theInvisibleWindowIsShownThenHiddenThenGrabs()
+{
+    recorder.reset();
+    buttons.reset();
+    const WindowWatcher watcher(focused.get());
+    buttons = std::make_unique<Buttons>(*configuration);
+    QCOMPARE(watcher.seen, (QStringList{"show, no grab", "hide, no grab"}));
+    QVERIFY(QWidget::keyboardGrabber() != nullptr);
 }
 
 void ButtonsTest::destructionReleasesTheKeyboard()

@@ -13,7 +13,14 @@
 
 #include <atomic>
 #include <future>
+#include <initializer_list>
 #include <memory>
+#include <utility>
+
+extern "C" {
+#include <msgq.h>
+#include <pool.h>
+}
 
 using Domain::DspPort;
 using TestSupport::DspPeer;
@@ -25,6 +32,22 @@ namespace
 constexpr quint32 dataType = 0x11004;
 constexpr quint32 ackType = 0x1100B;
 constexpr quint32 nakType = 0x1100C;
+
+constexpr const char* attachCall = "PROC_attach(dspProcessorId, NULL)";
+constexpr const char* poolOpenCall = "POOL_open(this->privateData->applicationPoolId, &poolAttributes)";
+constexpr const char* queueOpenCall =
+    "MSGQ_open(processorMessageQueueName, &this->privateData->processorMessageQueue, NULL)";
+constexpr const char* errorHandlerCall =
+    "MSGQ_setErrorHandler(this->privateData->processorMessageQueue, this->privateData->applicationPoolId)";
+constexpr const char* loadCall =
+    "PROC_load(dspProcessorId, this->privateData->dspExecutablePath.toAscii().data(), 0, NULL)";
+constexpr const char* startCall = "PROC_start(dspProcessorId)";
+constexpr const char* transportOpenCall = "MSGQ_transportOpen(dspProcessorId, &mqtAttrs)";
+constexpr const char* locateCall =
+    "MSGQ_locate(dspMessageQueueName, &this->privateData->dspMessageQueue, &syncLocateAttrs)";
+
+const QList<DspPeer::Kind> openingRequests{DspPeer::Attach, DspPeer::QueueOpen,     DspPeer::Load,
+                                           DspPeer::Start,  DspPeer::TransportOpen, DspPeer::Locate};
 
 const QStringList openTexts{QStringLiteral("DspLink: DSP execution started successfully."),
                             QStringLiteral("DspPort: open complete.")};
@@ -104,8 +127,7 @@ private slots:
     void openingLoadsStartsAndConnectsInOrder()
     {
         openPort();
-        QCOMPARE(peer->requestKinds(), (QList<DspPeer::Kind>{DspPeer::Attach, DspPeer::QueueOpen, DspPeer::Load,
-                                                             DspPeer::Start, DspPeer::TransportOpen, DspPeer::Locate}));
+        QCOMPARE(peer->requestKinds(), openingRequests);
         QCOMPARE(peer->requests().at(1).payload.mid(4), QByteArray("GPPMSGQ1"));
         QCOMPARE(peer->requests().at(2).payload, QByteArray("/dsp.out"));
         QCOMPARE(peer->requests().at(5).payload, QByteArray("DSPMSGQ0"));
@@ -136,37 +158,103 @@ private slots:
     void aRefusedStepIsFatalAndTheRestGoesOn_data()
     {
         QTest::addColumn<int>("kind");
-        QTest::addColumn<QString>("call");
-        QTest::newRow("attach") << int{DspPeer::Attach} << "PROC_attach(dspProcessorId, NULL)";
-        QTest::newRow("queue") << int{DspPeer::QueueOpen}
-                               << "MSGQ_open(processorMessageQueueName, &this->privateData->processorMessageQueue, "
-                                  "NULL)";
-        QTest::newRow("load")
-            << int{DspPeer::Load}
-            << "PROC_load(dspProcessorId, this->privateData->dspExecutablePath.toAscii().data(), 0, NULL)";
-        QTest::newRow("start") << int{DspPeer::Start} << "PROC_start(dspProcessorId)";
-        QTest::newRow("transport") << int{DspPeer::TransportOpen} << "MSGQ_transportOpen(dspProcessorId, &mqtAttrs)";
-        QTest::newRow("locate")
-            << int{DspPeer::Locate}
-            << "MSGQ_locate(dspMessageQueueName, &this->privateData->dspMessageQueue, &syncLocateAttrs)";
+        QTest::addColumn<QStringList>("fatal");
+        QTest::addColumn<QList<DspPeer::Kind>>("requests"); // what the library still asks the DSP for
+        const auto fatal = [](std::initializer_list<std::pair<const char*, const char*>> calls) {
+            QStringList lines;
+            for (const auto& [text, status] : calls)
+                lines += QStringLiteral("(priority 0) DspPort: %1. Status = 0x%2").arg(text, status);
+            return lines;
+        };
+        const auto upTo = [](DspPeer::Kind last) { return openingRequests.first(openingRequests.indexOf(last) + 1); };
+        const char* const refused = "80008028";
+        const char* const failed = "80008008";
+        QTest::newRow("attach") << int{DspPeer::Attach}
+                                << fatal({{attachCall, refused},
+                                          {poolOpenCall, "80008000"},
+                                          {queueOpenCall, failed},
+                                          {errorHandlerCall, failed},
+                                          {loadCall, "80008002"},
+                                          {startCall, "80008002"},
+                                          {transportOpenCall, "80008002"},
+                                          {locateCall, failed}})
+                                << upTo(DspPeer::Attach);
+        QTest::newRow("queue") << int{DspPeer::QueueOpen} << fatal({{queueOpenCall, refused}}) << openingRequests;
+        QTest::newRow("load") << int{DspPeer::Load}
+                              << fatal({{loadCall, refused},
+                                        {startCall, "8000801b"},
+                                        {transportOpenCall, "80008000"},
+                                        {locateCall, failed}})
+                              << upTo(DspPeer::Load);
+        QTest::newRow("start") << int{DspPeer::Start}
+                               << fatal({{startCall, refused}, {transportOpenCall, "80008000"}, {locateCall, failed}})
+                               << upTo(DspPeer::Start);
+        QTest::newRow("transport") << int{DspPeer::TransportOpen}
+                                   << fatal({{transportOpenCall, refused}, {locateCall, failed}})
+                                   << upTo(DspPeer::TransportOpen);
+        QTest::newRow("locate") << int{DspPeer::Locate} << fatal({{locateCall, refused}}) << openingRequests;
     }
 
     void aRefusedStepIsFatalAndTheRestGoesOn()
     {
         QFETCH(const int, kind);
-        QFETCH(const QString, call);
+        QFETCH(const QStringList, fatal);
+        QFETCH(const QList<DspPeer::Kind>, requests);
         peer->answer(static_cast<DspPeer::Kind>(kind), 0x80008028U);
         makePort();
         QVERIFY(port->open(QIODevice::ReadWrite));
-        QVERIFY(log->waitFor(openTexts.at(1)));
-        const auto lines = log->lines();
-        const auto fatal =
-            std::find_if(lines.begin(), lines.end(), [](const auto& line) { return line.priority == 0; });
-        QVERIFY(fatal != lines.end());
-        const auto texts = sourcedTexts(*log);
-        QVERIFY2(texts.contains(QStringLiteral("DspPort: %1. Status = 0x80008028").arg(call)),
-                 qPrintable(texts.join(u'\n')));
-        QVERIFY(texts.contains(openTexts.at(0)));
+        QStringList texts = sourcedTexts(*log, TestSupport::Priorities::Shown);
+        QCOMPARE(texts.takeLast(), openTexts.at(1));
+        QVERIFY(texts.removeOne(openTexts.at(0)));
+        QCOMPARE(texts, fatal);
+        QCOMPARE(peer->requestKinds(), requests);
+    }
+
+    void thePoolHasTenLargeBuffersAndEightSmall()
+    {
+        openPort();
+        QList<MSGQ_Msg> taken;
+        const auto allocate = [&](Uint16 size) {
+            MSGQ_Msg message = nullptr;
+            const DSP_STATUS status = MSGQ_alloc(0, size, &message);
+            if (message != nullptr)
+                taken.append(message);
+            return static_cast<quint32>(status);
+        };
+        for (const auto& [size, count] : {std::pair{Uint16{2048}, 10}, std::pair{Uint16{128}, 8}}) {
+            for (int number = 0; number < count; ++number)
+                QCOMPARE(allocate(size), 0x8000U);
+            QCOMPARE(allocate(size), 0x8000800CU);
+        }
+        QCOMPARE(allocate(129), 0x8000800BU); // no other size
+        // The port cannot close a pool with buffers out.
+        for (const MSGQ_Msg message : taken)
+            QCOMPARE(static_cast<quint32>(MSGQ_free(message)), 0x8000U);
+    }
+
+    void closingClosesThePool()
+    {
+        openPort();
+        port->close();
+        MSGQ_Msg message = nullptr;
+        QCOMPARE(static_cast<quint32>(MSGQ_alloc(0, 2048, &message)), 0x80008008U);
+        QCOMPARE(static_cast<quint32>(POOL_close(0)), 0x80008000U);
+    }
+
+    void locatingTheDspsQueueWaitsUntilTheFirmwareHasMadeIt()
+    {
+        peer->keepSilentOn(DspPeer::Locate);
+        auto firmware = std::async(std::launch::async, [this] {
+            for (int attempt = 0; attempt < 2000 && !peer->requestKinds().contains(DspPeer::Locate); ++attempt)
+                QThread::msleep(10);
+            QThread::msleep(500); // longer than anything that answers
+            peer->answerLocate();
+        });
+        openPort();
+        firmware.get();
+        QCOMPARE(port->write("command", 7), 7);
+        QTRY_COMPARE(peer->messages().size(), 1);
+        QCOMPARE(peer->messages().first().destination, DspPeer::dspQueue);
     }
 
     void withoutADspEveryCallIsReportedAndTheWindowStillComesUp()
@@ -174,23 +262,21 @@ private slots:
         peer.reset();
         makePort();
         QVERIFY(port->open(QIODevice::ReadWrite));
-        const QStringList expected{
-            "DspPort: PROC_setup(NULL). Status = 0x80008008",
-            "DspPort: PROC_attach(dspProcessorId, NULL). Status = 0x8000801b",
-            "DspPort: POOL_open(this->privateData->applicationPoolId, &poolAttributes). Status = 0x80008000",
-            "DspPort: MSGQ_open(processorMessageQueueName, &this->privateData->processorMessageQueue, NULL). "
-            "Status = 0x80008008",
-            "DspPort: MSGQ_setErrorHandler(this->privateData->processorMessageQueue, "
-            "this->privateData->applicationPoolId). Status = 0x80008008",
-            "DspPort: PROC_load(dspProcessorId, this->privateData->dspExecutablePath.toAscii().data(), 0, NULL). "
-            "Status = 0x8000800d",
-            "DspPort: PROC_start(dspProcessorId). Status = 0x8000800d",
-            openTexts.at(0),
-            "DspPort: MSGQ_transportOpen(dspProcessorId, &mqtAttrs). Status = 0x80008002",
-            "DspPort: MSGQ_locate(dspMessageQueueName, &this->privateData->dspMessageQueue, &syncLocateAttrs). "
-            "Status = 0x80008008",
-            openTexts.at(1)};
-        QStringList texts = sourcedTexts(*log);
+        const auto line = [](const char* call, const char* status) {
+            return QStringLiteral("(priority 0) DspPort: %1. Status = 0x%2").arg(call, status);
+        };
+        const QStringList expected{line("PROC_setup(NULL)", "80008008"),
+                                   line(attachCall, "8000801b"),
+                                   line(poolOpenCall, "80008000"),
+                                   line(queueOpenCall, "80008008"),
+                                   line(errorHandlerCall, "80008008"),
+                                   line(loadCall, "8000800d"),
+                                   line(startCall, "8000800d"),
+                                   openTexts.at(0),
+                                   line(transportOpenCall, "80008002"),
+                                   line(locateCall, "80008008"),
+                                   openTexts.at(1)};
+        const QStringList texts = sourcedTexts(*log, TestSupport::Priorities::Shown);
         QCOMPARE(texts, expected);
         QCOMPARE(port->write("x", 1), -1);
         QCOMPARE(sourcedTexts(*log), QStringList{"DspPort: MSGQ_alloc() failed. Status = 0x80008008"});
@@ -402,7 +488,8 @@ private slots:
         arrived(1);
         QCOMPARE(sourcedTexts(*log).size(), 50);
         port->close();
-        QVERIFY(port->open(QIODevice::ReadWrite)); // POOL_open would report a pool that is still open with buffers out
+        QCOMPARE(static_cast<quint32>(POOL_close(0)), 0x80008000U); // with a buffer out it would still be open
+        QVERIFY(port->open(QIODevice::ReadWrite));
         QCOMPARE(port->write("x", 1), 1);
     }
 
@@ -521,9 +608,7 @@ private slots:
                                            DspPeer::Detach};
         QCOMPARE(peer->requestKinds().mid(6), closing);
         QVERIFY(port->open(QIODevice::ReadWrite));
-        QCOMPARE(peer->requestKinds().mid(10),
-                 (QList<DspPeer::Kind>{DspPeer::Attach, DspPeer::QueueOpen, DspPeer::Load, DspPeer::Start,
-                                       DspPeer::TransportOpen, DspPeer::Locate}));
+        QCOMPARE(peer->requestKinds().mid(10), openingRequests);
         QCOMPARE(sourcedTexts(*log), openTexts);
         QVERIFY(peer->sendMessage(message(dataType, 40)));
         arrived(1);

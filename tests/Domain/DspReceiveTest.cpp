@@ -83,7 +83,6 @@ private:
     QVector<WirelessSensorReading> readings;
     PairingUpgradeData packet;
     QThread* emitter = nullptr;
-    int expectedReads = 0;
 
     void note(const QString& event)
     {

@@ -3,28 +3,33 @@
 
 #pragma once
 
-#include "Domain/src/DomainLayer/AbstractButtons.h"
+#include "tests/support/AssertionLine.h"
 #include "tests/support/DspPeer.h"
 #include "tests/support/LogCapture.h"
 #include "tests/support/LoggedTexts.h"
+#include "tests/support/ProcessorTime.h"
 
 #include <QFile>
 #include <QRegularExpression>
 
-#include <time.h>
-
 namespace TestSupport
 {
 
-/// What was logged since the last call; "Domain/src/DomainLayer/X.cpp, LINE, TEXT" shortened to "X: TEXT".
-/// Fatal lines are not told from warnings.
-inline QStringList sourcedTexts(LogCapture& log)
+enum class Priorities
+{
+    Hidden,
+    Shown ///< of fatal lines
+};
+
+/// What was logged since the last call; "Domain/src/DomainLayer/X.cpp, LINE, TEXT" shortened to "X: TEXT". Unless
+/// priorities are shown, fatal lines are not told from warnings.
+inline QStringList sourcedTexts(LogCapture& log, Priorities priorities = Priorities::Hidden)
 {
     static const QRegularExpression prefix(
-        QStringLiteral(R"(^(?:\(priority 0\) )?Domain/src/DomainLayer/(\w+)\.cpp, \d+, )"));
+        QStringLiteral(R"(^(\(priority 0\) )?Domain/src/DomainLayer/(\w+)\.cpp, \d+, )"));
     QStringList texts = loggedTexts(log);
     for (QString& text : texts)
-        text.replace(prefix, QStringLiteral("\\1: "));
+        text.replace(prefix, priorities == Priorities::Shown ? QStringLiteral("\\1\\2: ") : QStringLiteral("\\2: "));
     return texts;
 }
 
@@ -34,20 +39,5 @@ inline void writeFirmware()
     if (!image.open(QIODevice::WriteOnly) || image.write("firmware") < 0)
         qFatal("cannot write /dsp.out");
 }
-
-inline double processSeconds()
-{
-    timespec time{};
-    ::clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &time);
-    return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) * 1e-9;
-}
-
-/// A keypad without keys: the DSP listens to its assertion line only.
-class AssertionLine : public Domain::AbstractButtons
-{
-public:
-    bool buttonsLocked() override { return false; }
-    void setButtonLock(bool /*locked*/) override {}
-};
 
 } // namespace TestSupport

@@ -7,8 +7,11 @@ if(NOT DSPLINK_ROOT)
     LIBRARIES DspLink LABELS integration)
   immunityrig_test(DspLinkMessageTest SOURCES dsplink/DspLinkMessageTest.cpp dsplink/DspLinkTestCase.h
     LIBRARIES DspLink LABELS integration)
+  # Linked in front of the library, the DSP in the process takes the place of the whole interface.
+  immunityrig_test(DspPortCallsTest SOURCES Domain/DspPortCallsTest.cpp support/InstantDsp.cpp support/InstantDsp.h
+    LIBRARIES Domain DspLink LABELS unit)
 endif()
-immunityrig_test(DspPortTest SOURCES Domain/DspPortTest.cpp Domain/DspTestParts.h LIBRARIES Domain LABELS integration)
+immunityrig_test(DspPortTest SOURCES Domain/DspPortTest.cpp Domain/DspTestParts.h LIBRARIES Domain DspLink LABELS integration)
 immunityrig_test(DspPortOpeningTest SOURCES Domain/DspPortOpeningTest.cpp LIBRARIES Domain LABELS integration)
 immunityrig_test(DspTest SOURCES Domain/DspTest.cpp LIBRARIES Domain LABELS integration)
 immunityrig_test(DspReceiveTest SOURCES Domain/DspReceiveTest.cpp LIBRARIES Domain LABELS integration)

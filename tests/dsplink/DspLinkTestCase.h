@@ -3,6 +3,7 @@
 #pragma once
 
 #include "tests/support/DspPeer.h"
+#include "tests/support/ProcessorTime.h"
 
 #include <QFile>
 #include <QObject>
@@ -11,7 +12,6 @@
 #include <msgq.h>
 #include <pool.h>
 #include <proc.h>
-#include <time.h>
 
 #include <cstring>
 #include <memory>
@@ -47,13 +47,6 @@ protected:
     {
         return {reinterpret_cast<const char*>(message) + sizeof(MSGQ_MsgHeader),
                 static_cast<qsizetype>(MSGQ_getMsgSize(message) - sizeof(MSGQ_MsgHeader))};
-    }
-
-    static double threadSeconds()
-    {
-        timespec time{};
-        ::clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &time);
-        return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) * 1e-9;
     }
 
     DSP_STATUS openQueue(const char* name, MSGQ_Queue* queue)

@@ -159,8 +159,10 @@ void DspPeer::handle(const QByteArray& packet)
 void DspPeer::handleRequest(Kind kind, quint32 serial, const QByteArray& payload)
 {
     quint32 status = done;
+    RequestHandler receiver;
     {
         const std::lock_guard lock(mutex);
+        receiver = requestHandler;
         seenRequests.append({kind, payload});
         if (kind == QueueOpen && payload.mid(4) == "GPPMSGQ1")
             queueOfHost = numberOf<quint32>(payload, 0);
@@ -172,6 +174,8 @@ void DspPeer::handleRequest(Kind kind, quint32 serial, const QByteArray& payload
         if (const auto found = answers.find(kind); found != answers.end())
             status = found->second;
     }
+    if (receiver)
+        receiver(*this, kind);
     reply(serial, status, kind == Locate ? dspQueue : 0);
 }
 
@@ -209,6 +213,12 @@ void DspPeer::onMessage(MessageHandler newHandler)
 {
     const std::lock_guard lock(mutex);
     handler = std::move(newHandler);
+}
+
+void DspPeer::onRequest(RequestHandler newHandler)
+{
+    const std::lock_guard lock(mutex);
+    requestHandler = std::move(newHandler);
 }
 
 void DspPeer::acknowledgeAll()

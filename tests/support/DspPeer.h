@@ -57,6 +57,7 @@ public:
         [[nodiscard]] quint32 word(qsizetype offset) const; ///< little-endian, of the data
     };
     using MessageHandler = std::function<void(DspPeer&, const HostMessage&)>;
+    using RequestHandler = std::function<void(DspPeer&, Kind)>;
 
     static constexpr quint32 dspQueue = 0x00000003;
     static constexpr quint32 done = 0x8000;
@@ -72,6 +73,8 @@ public:
     /// Answers, as the firmware does that has made its queue only now, every locate that was kept waiting.
     void answerLocate(quint32 status = done);
     void onMessage(MessageHandler handler);
+    /// Called before the request is answered.
+    void onRequest(RequestHandler handler);
     /// Acknowledges every command from now on.
     void acknowledgeAll();
     /// Takes nothing off the socket any more, until told to.
@@ -123,6 +126,7 @@ private:
     QList<Request> seenRequests;
     QList<HostMessage> seenMessages;
     MessageHandler handler;
+    RequestHandler requestHandler;
     std::thread thread;
 };
 

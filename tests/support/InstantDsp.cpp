@@ -11,6 +11,7 @@
 #include <array>
 #include <chrono>
 #include <condition_variable>
+#include <cstdio>
 #include <cstring>
 #include <mutex>
 
@@ -72,6 +73,39 @@ std::uint8_t* dataOf(MSGQ_Msg message)
     return reinterpret_cast<std::uint8_t*>(message) + headerSize;
 }
 
+constexpr std::size_t longestCall = 120;
+constexpr std::size_t callsKept = 32;
+
+/// The calls that open and close the link; of fixed size, too.
+struct Record
+{
+    std::array<std::array<char, longestCall>, callsKept> calls{};
+    std::size_t count = 0;
+    const char* refused = "";
+};
+
+Record record;
+
+const char* presence(const void* pointer)
+{
+    return pointer == nullptr ? "null" : "something";
+}
+
+/// Keeps the call; its result unless it is to be refused.
+template <typename... Arguments>
+DSP_STATUS called(DSP_STATUS result, const char* name, const char* format, Arguments... arguments)
+{
+    if (record.count < callsKept) {
+        char* const text = record.calls[record.count++].data();
+        const auto length = static_cast<std::size_t>(std::snprintf(text, longestCall, "%s(", name));
+        const auto rest =
+            static_cast<std::size_t>(std::snprintf(text + length, longestCall - length, format, arguments...));
+        std::snprintf(text + length + rest, longestCall - length - rest, ")");
+    }
+    const bool refused = std::strcmp(name, record.refused) == 0;
+    return refused ? static_cast<DSP_STATUS>(TestSupport::InstantDsp::refusal) : result;
+}
+
 } // namespace
 
 void TestSupport::InstantDsp::deliver(const QByteArray& data, std::uint16_t id)
@@ -87,76 +121,101 @@ void TestSupport::InstantDsp::deliver(const QByteArray& data, std::uint16_t id)
     link().changed.notify_all();
 }
 
-DSP_STATUS PROC_setup(LINKCFG_Object* /*linkCfg*/)
+QStringList TestSupport::InstantDsp::takeCalls()
 {
-    return DSP_SOK;
+    QStringList all;
+    for (std::size_t index = 0; index < record.count; ++index)
+        all.append(QString::fromLatin1(record.calls[index].data()));
+    record.count = 0;
+    return all;
 }
 
-DSP_STATUS PROC_attach(ProcessorId /*procId*/, PROC_Attrs* /*attr*/)
+void TestSupport::InstantDsp::refuse(const char* call)
 {
-    return DSP_SOK;
+    record.refused = call;
 }
 
-DSP_STATUS PROC_load(ProcessorId /*procId*/, Char8* /*imagePath*/, Uint32 /*argc*/, Char8** /*argv*/)
+DSP_STATUS PROC_setup(LINKCFG_Object* linkCfg)
 {
-    return DSP_SOK;
+    return called(DSP_SOK, "PROC_setup", "%s", presence(linkCfg));
 }
 
-DSP_STATUS PROC_start(ProcessorId /*procId*/)
+DSP_STATUS PROC_attach(ProcessorId procId, PROC_Attrs* attr)
 {
-    return DSP_SOK;
+    return called(DSP_SOK, "PROC_attach", "%u, %s", procId, presence(attr));
 }
 
-DSP_STATUS PROC_stop(ProcessorId /*procId*/)
+DSP_STATUS PROC_load(ProcessorId procId, Char8* imagePath, Uint32 argc, Char8** argv)
 {
-    return DSP_SSTOPPED;
+    return called(DSP_SOK, "PROC_load", "%u, %s, %u, %s", procId, imagePath, argc, presence(argv));
 }
 
-DSP_STATUS PROC_detach(ProcessorId /*procId*/)
+DSP_STATUS PROC_start(ProcessorId procId)
 {
-    return DSP_SDETACHED;
+    return called(DSP_SOK, "PROC_start", "%u", procId);
 }
 
-DSP_STATUS POOL_open(PoolId /*poolId*/, Pvoid /*params*/)
+DSP_STATUS PROC_stop(ProcessorId procId)
 {
-    return DSP_SOK;
+    return called(DSP_SSTOPPED, "PROC_stop", "%u", procId);
 }
 
-DSP_STATUS POOL_close(PoolId /*poolId*/)
+DSP_STATUS PROC_detach(ProcessorId procId)
 {
-    return DSP_SCLOSED;
+    return called(DSP_SDETACHED, "PROC_detach", "%u", procId);
 }
 
-DSP_STATUS MSGQ_open(Pstr /*queueName*/, MSGQ_Queue* msgqQueue, MSGQ_Attrs* /*attrs*/)
+DSP_STATUS POOL_open(PoolId poolId, Pvoid params)
 {
-    *msgqQueue = hostQueue;
-    return DSP_SOK;
+    const auto* const pool = static_cast<const SMAPOOL_Attrs*>(params);
+    std::array<char, longestCall> sizes{};
+    std::size_t length = 0;
+    for (Uint32 entry = 0; entry < pool->numBufPools && length < sizes.size(); ++entry)
+        length += static_cast<std::size_t>(std::snprintf(sizes.data() + length, sizes.size() - length, " %u x %u,",
+                                                         pool->numBuffers[entry], pool->bufSizes[entry]));
+    return called(DSP_SOK, "POOL_open", "%u, %u:%s %s", poolId, pool->numBufPools, sizes.data(),
+                  pool->exactMatchReq == TRUE ? "exact" : "any");
 }
 
-DSP_STATUS MSGQ_close(MSGQ_Queue /*msgqQueue*/)
+DSP_STATUS POOL_close(PoolId poolId)
 {
-    return DSP_SOK;
+    return called(DSP_SCLOSED, "POOL_close", "%u", poolId);
 }
 
-DSP_STATUS MSGQ_setErrorHandler(MSGQ_Queue /*errorQueue*/, PoolId /*poolId*/)
+DSP_STATUS MSGQ_open(Pstr queueName, MSGQ_Queue* msgqQueue, MSGQ_Attrs* attrs)
 {
-    return DSP_SOK;
+    const DSP_STATUS status = called(DSP_SOK, "MSGQ_open", "%s, %s", queueName, presence(attrs));
+    if (DSP_SUCCEEDED(status))
+        *msgqQueue = hostQueue;
+    return status;
 }
 
-DSP_STATUS MSGQ_transportOpen(ProcessorId /*procId*/, Pvoid /*attrs*/)
+DSP_STATUS MSGQ_close(MSGQ_Queue msgqQueue)
 {
-    return DSP_SOK;
+    return called(DSP_SOK, "MSGQ_close", "%x", msgqQueue);
 }
 
-DSP_STATUS MSGQ_transportClose(ProcessorId /*procId*/)
+DSP_STATUS MSGQ_setErrorHandler(MSGQ_Queue errorQueue, PoolId poolId)
 {
-    return DSP_SCLOSED;
+    return called(DSP_SOK, "MSGQ_setErrorHandler", "%x, %u", errorQueue, poolId);
 }
 
-DSP_STATUS MSGQ_locate(Pstr /*queueName*/, MSGQ_Queue* msgqQueue, MSGQ_LocateAttrs* /*attrs*/)
+DSP_STATUS MSGQ_transportOpen(ProcessorId procId, Pvoid attrs)
 {
-    *msgqQueue = dspQueue;
-    return DSP_SOK;
+    return called(DSP_SOK, "MSGQ_transportOpen", "%u, %u", procId, static_cast<const ZCPYMQT_Attrs*>(attrs)->poolId);
+}
+
+DSP_STATUS MSGQ_transportClose(ProcessorId procId)
+{
+    return called(DSP_SCLOSED, "MSGQ_transportClose", "%u", procId);
+}
+
+DSP_STATUS MSGQ_locate(Pstr queueName, MSGQ_Queue* msgqQueue, MSGQ_LocateAttrs* attrs)
+{
+    const DSP_STATUS status = called(DSP_SOK, "MSGQ_locate", "%s, %x", queueName, attrs->timeout);
+    if (DSP_SUCCEEDED(status))
+        *msgqQueue = dspQueue;
+    return status;
 }
 
 DSP_STATUS MSGQ_alloc(PoolId /*poolId*/, Uint16 size, MSGQ_Msg* msg)

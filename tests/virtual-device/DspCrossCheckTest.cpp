@@ -1,9 +1,9 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
-#include "Domain/src/DomainLayer/AbstractButtons.h"
 #include "Domain/src/DomainLayer/Dsp.h"
 #include "Domain/src/DomainLayer/DspPort.h"
+#include "tests/support/AssertionLine.h"
 #include "tests/support/LogCapture.h"
 #include "tests/virtual-device/ModelThread.h"
 #include "virtual-device/dsp/DspModel.h"
@@ -13,7 +13,9 @@
 #include <QElapsedTimer>
 #include <QFile>
 #include <QTest>
+#include <QThread>
 
+#include <atomic>
 #include <mutex>
 
 using namespace VirtualDevice;
@@ -22,13 +24,6 @@ namespace
 {
 
 const QString image = QStringLiteral("/dsp.out");
-
-class NoButtons : public Domain::AbstractButtons
-{
-public:
-    bool buttonsLocked() override { return false; }
-    void setButtonLock(bool) override {}
-};
 
 /// What the program's DSP object says, in its own thread and in order.
 struct Heard
@@ -65,7 +60,7 @@ class DspCrossCheckTest : public QObject
     TestSupport::LogCapture log;
     std::unique_ptr<Registry> registry;
     std::unique_ptr<ModelThread<DspModel>> model;
-    NoButtons buttons;
+    TestSupport::AssertionLine buttons;
     std::unique_ptr<Domain::DspPort> port;
     std::unique_ptr<Heard> heard;
     std::unique_ptr<Domain::Dsp> dsp;
@@ -108,6 +103,33 @@ class DspCrossCheckTest : public QObject
                 to->frames.append(readings);
             },
             direct);
+    }
+
+    /// A sensor's samples `first`, `first` + `step` and so on below `end`.
+    static QByteArray samples(quint16 frame, int slot, int first, int end, int step = 1)
+    {
+        QByteArray bytes;
+        for (int offset = first; offset < end; offset += step)
+            bytes.append(static_cast<char>(SensorFrame::sample(frame, slot, offset)));
+        return bytes;
+    }
+    static QVector<QByteArray> channelsOfTypeZero(quint16 frame, int slot)
+    {
+        return {samples(frame, slot, 0, 54), samples(frame, slot, 54, 60, 3), samples(frame, slot, 55, 60, 3),
+                samples(frame, slot, 56, 60, 3)};
+    }
+    static QVector<QByteArray> channelsOfType31(quint16 frame, int slot)
+    {
+        return {samples(frame, slot, 0, 3), samples(frame, slot, 3, 5), samples(frame, slot, 5, 6)};
+    }
+
+    static void compareHeader(const Domain::WirelessSensorReading& reading, quint16 frame, int slot)
+    {
+        QCOMPARE(reading.frameNumber(), frame);
+        QCOMPARE(int(reading.batteryLevel()), 100 + slot);
+        QCOMPARE(int(reading.signalStrength()), 200 - slot);
+        QCOMPARE(reading.pin1IsSet(), (slot & 1) != 0);
+        QCOMPARE(reading.pin2IsSet(), (slot & 2) != 0);
     }
 
 private slots:
@@ -193,29 +215,40 @@ private slots:
         QVERIFY(log.waitFor(QStringLiteral("DSP Log: 100%n of it")));
     }
 
+    void sensorFramesAreDecodedToWhatTheSensorsSent_data()
+    {
+        QTest::addColumn<int>("ratio");
+        QTest::newRow("as sampled") << 1;
+        QTest::newRow("upsampled") << 2;
+    }
+
     void sensorFramesAreDecodedToWhatTheSensorsSent()
     {
+        QFETCH(const int, ratio);
+        constexpr int frames = 20;
         set("dsp.sensors", 15);
         set("dsp.sensor_types", "mixed");
+        set("dsp.sensor_ratio", ratio);
         set("dsp.sensor_rate", 100);
         QVERIFY(dsp->setReceiverEnableTest(1));
-        QTRY_VERIFY(heard->frameCount() >= 20);
+        QTRY_VERIFY(heard->frameCount() >= frames);
         QVERIFY(dsp->setReceiverEnableTest(0));
-        for (quint16 frame = 0; frame < 20; ++frame) {
+        // A message has no room for sixteen upsampled slots of type 0.
+        if (ratio == 2)
+            QVERIFY(log.waitFor(QStringLiteral("119 too small, required = 120")));
+        const std::lock_guard lock(heard->mutex);
+        for (quint16 frame = 0; frame < frames; ++frame) {
             const auto& readings = heard->frames[frame];
             QCOMPARE(readings.size(), 16);
             for (int slot = 0; slot < 15; ++slot) {
-                const auto& reading = readings[slot];
-                QVERIFY(reading.isValid());
-                QCOMPARE(reading.frameNumber(), frame);
-                QCOMPARE(int(reading.sensorType()), slot % 2 == 0 ? 0 : 31);
-                QCOMPARE(int(reading.batteryLevel()), 100 + slot);
-                QCOMPARE(int(reading.signalStrength()), 200 - slot);
-                QCOMPARE(reading.pin1IsSet(), (slot & 1) != 0);
-                QCOMPARE(reading.pin2IsSet(), (slot & 2) != 0);
-                QCOMPARE(reading.channelData().size(), slot % 2 == 0 ? 4 : 3);
-                QCOMPARE(quint8(reading.channelData()[0][2]), SensorFrame::sample(frame, slot, 2));
-                QCOMPARE(quint8(reading.channelData()[1][0]), SensorFrame::sample(frame, slot, slot % 2 == 0 ? 54 : 3));
+                const bool isTypeZero = slot % 2 == 0;
+                compareHeader(readings[slot], frame, slot);
+                QCOMPARE(readings[slot].upsampleRatio(), ratio);
+                QCOMPARE(int(readings[slot].sensorType()), isTypeZero ? 0 : 31);
+                QCOMPARE(readings[slot].isValid(), !isTypeZero || ratio == 1);
+                if (readings[slot].isValid())
+                    QCOMPARE(readings[slot].channelData(),
+                             isTypeZero ? channelsOfTypeZero(frame, slot) : channelsOfType31(frame, slot));
             }
             QVERIFY(!readings[15].isValid());
         }
@@ -239,17 +272,38 @@ private slots:
 
     void anAnswerOvertakesTheSensorsData()
     {
+        // A slow listener: the frames that wait would take it far longer than a command may.
+        constexpr int backlog = 100;
+        std::atomic<int> announced = 0;
+        connect(
+            port.get(), &Domain::DspPort::readyRead, this, [&] { ++announced; }, Qt::DirectConnection);
+        std::atomic<int> handled = 0;
+        std::atomic<bool> slow = true;
+        connect(
+            dsp.get(), &Domain::Dsp::sensorDataReceived, dsp.get(),
+            [&] {
+                ++handled;
+                if (slow)
+                    QThread::msleep(20);
+            },
+            Qt::DirectConnection);
         set("dsp.sensor_rate", 500);
         QVERIFY(dsp->setReceiverEnableTest(1));
-        for (int count = 0; count < 50; ++count)
+        QTRY_VERIFY_WITH_TIMEOUT(announced - handled > backlog, 20000);
+        for (int count = 0; count < 10; ++count) {
             QVERIFY(dsp->runHardwareTest(count));
+            QVERIFY(announced - handled > backlog / 2);
+        }
         QVERIFY(dsp->setReceiverEnableTest(0));
+        slow = false;
         QCOMPARE(number("dsp.messages_lost"), 0);
+        disconnect(dsp.get(), &Domain::Dsp::sensorDataReceived, dsp.get(), nullptr);
     }
 
     void aDspThatGoesAwayFailsCommandsAndNothingElse()
     {
         set("dsp.presence", "missing");
+        QTRY_COMPARE(text("dsp.state"), QStringLiteral("off")); // in a thread of its own
         QElapsedTimer clock;
         clock.start();
         QVERIFY(!dsp->runHardwareTest(1));

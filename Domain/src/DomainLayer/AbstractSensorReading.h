@@ -9,6 +9,8 @@ namespace Domain
 {
 
 /// What a sensor reading of any kind tells: which frame it came in and how densely that frame was sampled.
+///
+/// Threads: readings are values; any thread may have its own.
 class AbstractSensorReading
 {
 public:

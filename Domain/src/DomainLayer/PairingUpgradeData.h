@@ -27,6 +27,9 @@ namespace Domain
 /// | 7      | rest | data, to the end of the packet                                     |
 ///
 /// Threads: a value; its shared data are counted atomically, so copies may go to other threads.
+///
+/// Errors: a stream that is too short is logged and leaves the packet as it was, invalid if new; an address that has
+/// no place in 24 bits is logged and written as zero.
 class PairingUpgradeData
 {
 public:
