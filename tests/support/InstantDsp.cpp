@@ -64,7 +64,8 @@ struct Link
 
 Link& link()
 {
-    static Link instance;
+    // Never destroyed: a port that is static itself reads from it until the very end of the program.
+    static Link& instance = *new Link;
     return instance;
 }
 
