@@ -23,29 +23,39 @@ const QString resetFileName = QStringLiteral("/sys/class/misc/msp430/reset");
 constexpr char resetCommand = '1';
 constexpr qsizetype chunkSize = 4096;
 
-/// No allocation: on a noisy line this is called for every byte.
+using Outcome = FrameParser::Outcome;
+
+const QString sourceFile = QStringLiteral(__FILE__);
+
+struct Refusal
+{
+    int line;
+    QString text;
+};
+
+/// In the order of the outcomes from the first refusal on. On a noisy line one of them is logged for every byte, so
+/// they are made once.
+const std::array<Refusal, 4> refusals{{
+    {__LINE__, QStringLiteral("Received invalid header checksum")},
+    {__LINE__, QStringLiteral("Received too large of a payload length")},
+    {__LINE__, QStringLiteral("Received invalid data checksum")},
+    {__LINE__, QStringLiteral("Did not receive end-of-packet byte")},
+}};
+constexpr auto firstRefusal = static_cast<std::size_t>(Outcome::InvalidHeaderChecksum);
+static_assert(static_cast<std::size_t>(Outcome::PayloadTooLong) == firstRefusal + 1);
+static_assert(static_cast<std::size_t>(Outcome::InvalidDataChecksum) == firstRefusal + 2);
+static_assert(static_cast<std::size_t>(Outcome::MissingEndOfPacket) == firstRefusal + 3);
+
 void warn(int line, const QString& text)
 {
-    static const QString source = QStringLiteral(__FILE__);
-    Utilities::Debug::warningMessage(source, line, text);
+    Utilities::Debug::warningMessage(sourceFile, line, text);
 }
 
-void warnOfRefusal(FrameParser::Outcome reason)
+void warnOfRefusal(Outcome reason)
 {
-    switch (reason) {
-    // NOLINTNEXTLINE(bugprone-branch-clone): the texts differ, but inside lambdas, which the check takes for the same
-    case FrameParser::Outcome::InvalidHeaderChecksum:
-        return warn(__LINE__, QStringLiteral("Received invalid header checksum"));
-    case FrameParser::Outcome::PayloadTooLong:
-        return warn(__LINE__, QStringLiteral("Received too large of a payload length"));
-    case FrameParser::Outcome::InvalidDataChecksum:
-        return warn(__LINE__, QStringLiteral("Received invalid data checksum"));
-    case FrameParser::Outcome::MissingEndOfPacket:
-        return warn(__LINE__, QStringLiteral("Did not receive end-of-packet byte"));
-    case FrameParser::Outcome::NeedsMoreBytes:
-    case FrameParser::Outcome::FrameReceived:
-        break;
-    }
+    const auto index = static_cast<std::size_t>(reason) - firstRefusal;
+    if (index < refusals.size())
+        return warn(refusals[index].line, refusals[index].text);
     warn(__LINE__, QStringLiteral("ERROR: serial recieve parser in unknown state %1").arg(static_cast<int>(reason)));
 }
 
@@ -146,13 +156,19 @@ void SerialProtocol::processData()
 void SerialProtocol::parse(QByteArrayView bytes)
 {
     data->parser.append(bytes);
-    data->parser.parse([this](FrameParser::Outcome outcome, QByteArrayView payload) {
-        if (outcome != FrameParser::Outcome::FrameReceived)
-            return warnOfRefusal(outcome);
-        QByteArray message = data->messageOf(payload);
-        emit messageReceived(message);
-        data->lastMessage = std::move(message);
+    data->parser.parse([this](Outcome outcome, QByteArrayView payload) {
+        if (outcome == Outcome::FrameReceived)
+            deliver(payload);
+        else
+            warnOfRefusal(outcome);
     });
+}
+
+void SerialProtocol::deliver(QByteArrayView payload)
+{
+    QByteArray message = data->messageOf(payload);
+    emit messageReceived(message);
+    data->lastMessage = std::move(message);
 }
 
 } // namespace Domain

@@ -44,6 +44,7 @@ private:
     class PrivateData;
 
     void parse(QByteArrayView bytes);
+    void deliver(QByteArrayView payload);
 
     std::unique_ptr<PrivateData> data;
 };
