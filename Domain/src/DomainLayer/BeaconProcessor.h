@@ -51,8 +51,10 @@ class SerialPort;
 /// | 0xFF  | refusal               | reason                                    | error(NakReceived)              |
 ///
 /// Errors: logged; where the microcontroller's answer is at fault, `error` is emitted as well. An operation whose
-/// arguments are out of range returns false and sends nothing. So does a write that fails: the command then counts as
-/// pending for good, until a processor is made anew.
+/// arguments are out of range returns false and sends nothing. So does one whose write fails; but its command counts as
+/// pending from then on, with no time-out, and all that follow are queued, until the microcontroller acknowledges or
+/// refuses something after all or a processor is made anew. A queued command whose write fails is lost, which the log
+/// alone tells; nothing is pending then, and what is still queued follows the next command.
 class BeaconProcessor : public AbstractBeaconProcessor
 {
     Q_OBJECT

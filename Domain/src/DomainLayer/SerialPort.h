@@ -13,10 +13,10 @@ namespace Domain
 
 /// A Linux tty as a byte stream: raw, 8 data bits, no flow control, at a fixed speed.
 ///
-/// Threads: opened, closed and destroyed by one thread. While it is open with read access, a thread of its own moves
-/// what arrives into a receive buffer, at most 46 bytes at a time, and emits `readyRead()` once a chunk: receivers on
-/// other threads get it queued. Reading (one thread) and writing (one thread at a time) may happen on different
-/// threads.
+/// Threads: any may open, close and destroy it, one at a time and none during a read or a write. While it is open with
+/// read access, a thread of its own moves what arrives into a receive buffer, at most 46 bytes at a time, and emits
+/// `readyRead()` once a chunk: receivers on other threads get it queued. One thread reads; any may write, several at
+/// once, too.
 ///
 /// Reading never blocks: it takes from the receive buffer. The buffer holds about 256 KiB, 20 seconds of a line at
 /// 115200 baud; when its reader is further behind than that, bytes wait with the driver.

@@ -15,8 +15,8 @@ namespace Domain
 /// Turns the byte stream of a device into whole, checked messages for the radio microcontroller and back; `Frame` has
 /// the wire format. Opens the device and pulses the microcontroller's reset line once, when it is made.
 ///
-/// Threads: lives on the thread that made it, where it receives. `sendMessage` may be called from any thread as long as
-/// the device may be written from there; no two calls at a time.
+/// Threads: lives on the thread that made it, where it receives. `sendMessage` may be called from wherever the device
+/// may be written, and by as many threads at a time as may write to it (a `SerialPort`: any).
 ///
 /// Errors: logged. Damaged frames are dropped byte by byte until an intact one is found. A device that cannot be opened
 /// is kept: what is sent fails.
