@@ -93,7 +93,8 @@ private slots:
     void logLinesArriveWithPriorityAndIdentity();
     void stalledLogReadsNothing();
     void resetLineResetsTheRadio();
-    void brokenRulesOfTheDspAreMonitorEvents();
+    void brokenRulesAreMonitorEvents_data();
+    void brokenRulesAreMonitorEvents();
     void absentRadioHasNoSerialDevice();
     void stateFolderIsKept();
     void ownStateGoesWithTheDevice();
@@ -256,11 +257,28 @@ void DeviceTest::resetLineResetsTheRadio()
     QTRY_COMPARE_WITH_TIMEOUT(device.registry().integer("radio.resets"), 1, limit);
 }
 
-void DeviceTest::brokenRulesOfTheDspAreMonitorEvents()
+void DeviceTest::brokenRulesAreMonitorEvents_data()
 {
-    // A start that comes before everything else, once the listener is there.
-    Device device(shell("until test -e /mnt/boot/go; do sleep 0.05; done; "
-                        "printf '\\004\\0\\0\\0\\001\\0\\0\\0' | socat - UNIX-CONNECT:/dev/dsplink,type=5; sleep 60"));
+    QTest::addColumn<QString>("act");
+    QTest::addColumn<QString>("source");
+    QTest::addColumn<QString>("what");
+    QTest::addRow("a start of the DSP before everything else")
+        << "printf '\\004\\0\\0\\0\\001\\0\\0\\0' | socat - UNIX-CONNECT:/dev/dsplink,type=5"
+        << "dsp"
+        << "start out of order";
+    QTest::addRow("a command that the radio does not know")
+        << "printf '|\\0\\001\\0\\231\\001\\026\\231\\n' >/dev/ttyS1"
+        << "radio"
+        << "unknown command 0x99";
+}
+
+void DeviceTest::brokenRulesAreMonitorEvents()
+{
+    QFETCH(const QString, act);
+    QFETCH(const QString, source);
+    QFETCH(const QString, what);
+    // Once the listener is there.
+    Device device(shell(QStringLiteral("until test -e /mnt/boot/go; do sleep 0.05; done; %1; sleep 60").arg(act)));
     QCOMPARE(device.start(), std::nullopt);
     QLocalSocket listener;
     listener.connectToServer(device.controlSocket());
@@ -274,9 +292,9 @@ void DeviceTest::brokenRulesOfTheDspAreMonitorEvents()
     QTRY_VERIFY_WITH_TIMEOUT(listener.canReadLine(), limit);
     const auto event = QJsonDocument::fromJson(listener.readLine()).object()["params"].toObject();
     QCOMPARE(event, (QJsonObject{{"kind", "monitor"},
-                                 {"source", "dsp"},
+                                 {"source", source},
                                  {"event", "violation"},
-                                 {"details", QJsonObject{{"what", "start out of order"}}}}));
+                                 {"details", QJsonObject{{"what", what}}}}));
 }
 
 void DeviceTest::absentRadioHasNoSerialDevice()

@@ -219,7 +219,7 @@ private slots:
         QTRY_COMPARE(tty->messages(), Messages{"ff00"});
         set("radio.ack", "off");
         command("7e");
-        QTest::qWait(2600); // longer than the monitor expects a program to wait
+        QTest::qWait(static_cast<int>(RadioMonitor::patience.count()) + 100); // then the program may have given up
         command("7e");
         QTRY_COMPARE(number("radio.commands"), 4);
         QCOMPARE(number("radio.violations"), 0);

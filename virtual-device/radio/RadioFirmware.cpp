@@ -68,7 +68,6 @@ void RadioFirmware::reset()
 {
     ++life;
     replies.clear();
-    awake = false;
     accelFrame = 0;
     for (const char* flag : {"radio.transmitting", "radio.amplifier", "radio.beacon"})
         publish(flag, false);

@@ -22,8 +22,8 @@ class Registry;
 /// `radio.check`, `radio.text`, `radio.accel_rate`, ...). It knows messages only; frames and the line are RadioModel's.
 ///
 /// A command is carried out and published before it is acknowledged, so whoever sees the acknowledgement finds the new
-/// state. Silent from its reset until the program has shown that it listens (`wake`): a terminal that is just being
-/// opened throws away what is waiting in it. Lives in the thread of its owner, which must run an event loop.
+/// state. Silent until a first reset or command has shown that the program listens (`wake`): a terminal that is just
+/// being opened throws away what is waiting in it. Lives in the thread of its owner, which must run an event loop.
 class RadioFirmware : public QObject
 {
     Q_OBJECT

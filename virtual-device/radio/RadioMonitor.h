@@ -27,8 +27,8 @@ class RadioMonitor : public QObject
     Q_OBJECT
 
 public:
-    /// The program waits 3 s for an acknowledgement; the rest is for a monitor that was scheduled late.
-    static constexpr std::chrono::milliseconds patience{2500};
+    /// The program waits 3 s for an acknowledgement; the rest is for a monitor that read the first command late.
+    static constexpr std::chrono::milliseconds patience{1500};
 
     using QObject::QObject;
 

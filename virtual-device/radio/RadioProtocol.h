@@ -6,7 +6,6 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
-#include <string_view>
 
 /// What goes over the serial line between the program and the radio microcontroller, as the microcontroller's firmware
 /// sees it. Every message is the payload of one frame (RadioFrame.h): a code byte, then its data, big-endian.
@@ -65,24 +64,23 @@ enum class NakReason : std::uint8_t
 struct CommandShape
 {
     Command command;
-    std::string_view name;
     int shortest; ///< bytes after the code
     int longest;
 };
 
 inline constexpr std::array commandShapes{
-    CommandShape{Command::TransmitPacket, "transmit packet", 6, 37}, // address 3, channel, option, data 1 to 32
-    CommandShape{Command::StartBeacon, "start beacon", 7, 17},       // address 3, channels 4, packets 2 each, up to 5
-    CommandShape{Command::StopBeacon, "stop beacon", 1, 1},
-    CommandShape{Command::UpdateBeacon, "update beacon", 0, 10}, // packets 2 each, up to 5
-    CommandShape{Command::SetAccelMode, "set accelerometer mode", 1, 1},
-    CommandShape{Command::StartRfTest, "start RF test", 2, 2}, // channel, power level
-    CommandShape{Command::StopRfTest, "stop RF test", 0, 0},
-    CommandShape{Command::CheckRadio, "check radio", 0, 0},
-    CommandShape{Command::SetPowerAmp, "set power amplifier", 1, 1},
-    CommandShape{Command::ToggleFramePulse, "toggle frame pulse", 0, 0},
-    CommandShape{Command::RequestVersion, "request version", 0, 0},
-    CommandShape{Command::Ping, "ping", 0, 0},
+    CommandShape{Command::TransmitPacket, 6, 37},  // address 3, channel, option, data 1 to 32
+    CommandShape{Command::StartBeacon, 7, 17},     // address 3, channels 4, packets 2 each, up to 5
+    CommandShape{Command::StopBeacon, 1, 1},       // option
+    CommandShape{Command::UpdateBeacon, 0, 10},    // packets 2 each, up to 5
+    CommandShape{Command::SetAccelMode, 1, 1},     // mode
+    CommandShape{Command::StartRfTest, 2, 2},      // channel, power level
+    CommandShape{Command::StopRfTest, 0, 0},       // nothing
+    CommandShape{Command::CheckRadio, 0, 0},       // nothing
+    CommandShape{Command::SetPowerAmp, 1, 1},      // 1 on, 0 off
+    CommandShape{Command::ToggleFramePulse, 0, 0}, // nothing
+    CommandShape{Command::RequestVersion, 0, 0},   // nothing
+    CommandShape{Command::Ping, 0, 0},             // nothing
 };
 
 constexpr const CommandShape* shapeOf(std::uint8_t code)
