@@ -23,7 +23,6 @@ private slots:
     void powerKeyRaisesTheLatchOnEveryPress();
     void upAndDownWalkTheThreeChannels();
     void rightAndLeftWalkTheFourLevels();
-    void changesRestartThePacket();
     void enterStopsAndStartsTheTransmission();
     void softKey3SwitchesTheAntenna();
     void softKeys1And2AndPowerChangeNothingElse();
@@ -143,16 +142,6 @@ void KeysSystemTest::rightAndLeftWalkTheFourLevels()
         REQUIRE(device.tap("Left"));
         REQUIRE(device.waitControl("radio.power_level", level));
     }
-}
-
-/// The command is sent again even where the value stays.
-void KeysSystemTest::changesRestartThePacket()
-{
-    REQUIRE(device.waitControl("radio.channel", 2));
-    const qint64 before = device.get("radio.frames_good").toInteger();
-    REQUIRE(device.tap("Down"));
-    QTRY_VERIFY_WITH_TIMEOUT(device.get("radio.frames_good").toInteger() >= before + 2, 20000);
-    REQUIRE(device.waitControl("radio.transmitting", true));
 }
 
 void KeysSystemTest::enterStopsAndStartsTheTransmission()

@@ -2,7 +2,7 @@
 # SPDX-License-Identifier: MIT
 
 # The shipped program on the virtual device.
-foreach(test ScreenSystemTest KeysSystemTest StartAndEndSystemTest)
+foreach(test ScreenSystemTest KeysSystemTest RadioSystemTest StartAndEndSystemTest)
   immunityrig_test(${test} ON_DEVICE SOURCES system/${test}.cpp LIBRARIES DeviceTestSupport LABELS system)
   add_dependencies(${test} virtual-device immunityrig)
 endforeach()
