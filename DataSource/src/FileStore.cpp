@@ -6,7 +6,7 @@
 #include "DataSource/src/FileListing.h"
 #include "DataSource/src/FileStoreContents.h"
 #include "DataSource/src/FileSystemSpace.h"
-#include "utilities/Debug.h"
+#include "utilities/SourceWarnings.h"
 
 #include <QDir>
 #include <QFutureWatcher>
@@ -34,10 +34,7 @@ constexpr int unknownCapacityLine = 457;
 constexpr int scanWhileScanningLine = 474;
 constexpr int scanWhileDeletingLine = 479;
 
-void warn(int line, const QString& text)
-{
-    Utilities::Debug::warningMessage(__FILE__, line, text);
-}
+const Utilities::SourceWarnings warn(QStringLiteral(__FILE__));
 
 /// Work for the global thread pool, whose end its future reports. It is no `QtConcurrent::run`, whose task is read on
 /// the pool's thread before it comes to the work, and so before `handedOver` could show a sanitizer the threads' order.

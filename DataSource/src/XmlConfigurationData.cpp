@@ -4,6 +4,7 @@
 #include "DataSource/src/XmlConfigurationData.h"
 
 #include "utilities/Debug.h"
+#include "utilities/SourceWarnings.h"
 
 #include <QFile>
 #include <QMetaEnum>
@@ -41,10 +42,7 @@ QString nameOf(int key)
     return QString::fromLatin1(keys.valueToKey(key));
 }
 
-void warn(int line, const QString& text)
-{
-    Utilities::Debug::warningMessage(__FILE__, line, text);
-}
+const Utilities::SourceWarnings warn(QStringLiteral(__FILE__));
 
 void warnUnwritable(const QString& reason)
 {

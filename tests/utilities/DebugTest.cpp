@@ -5,6 +5,7 @@
 
 #include "tests/support/LogCapture.h"
 #include "utilities/LogWriter.h"
+#include "utilities/SourceWarnings.h"
 
 #include <QCoreApplication>
 #include <QElapsedTimer>
@@ -37,6 +38,7 @@ private slots:
     void emptyFileGivesALineThatStartsWithAComma();
     void negativeLineKeepsItsMinusSign();
     void sourceNameIsThePathFromTheProjectRoot();
+    void warningsOfASourceBeginWithItsName();
     void conversionInATextIsExpandedByTheLogService();
     void errnoConversionShowsTheCallersErrno();
     void literalForeignTextReachesTheLogAsReceived();
@@ -123,6 +125,16 @@ void DebugTest::negativeLineKeepsItsMinusSign()
 void DebugTest::sourceNameIsThePathFromTheProjectRoot()
 {
     QCOMPARE(QString(__FILE__), "tests/utilities/DebugTest.cpp");
+}
+
+void DebugTest::warningsOfASourceBeginWithItsName()
+{
+    LogCapture log;
+    const Utilities::SourceWarnings warn(QStringLiteral(__FILE__));
+    warn(419, "Reading when no data available");
+    QVERIFY(log.waitFor("available"));
+    QCOMPARE(log.texts(), QStringList{"tests/utilities/DebugTest.cpp, 419, Reading when no data available"});
+    QCOMPARE(log.lines().front().priority, 4);
 }
 
 void DebugTest::conversionInATextIsExpandedByTheLogService()

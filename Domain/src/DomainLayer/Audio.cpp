@@ -7,6 +7,7 @@
 #include "Domain/src/DomainLayer/AudioFeed.h"
 #include "Domain/src/DomainLayer/PlayRequests.h"
 #include "utilities/Debug.h"
+#include "utilities/SourceWarnings.h"
 
 #include <QFile>
 #include <QThread>
@@ -46,10 +47,7 @@ constexpr int mixerLevelsPerStep = 10;
 constexpr int sampleRate = 16000;
 constexpr Uint16 samplesPerBuffer = 4096;
 
-void warn(int line, const QString& text)
-{
-    Utilities::Debug::warningMessage(__FILE__, line, text);
-}
+const Utilities::SourceWarnings warn(QStringLiteral(__FILE__));
 
 /// Keeps SDL's audio callback out. Without an open device there is no callback, and this locks nothing.
 class CallbackLock

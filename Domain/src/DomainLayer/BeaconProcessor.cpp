@@ -6,6 +6,7 @@
 #include "Domain/src/DomainLayer/SerialPort.h"
 #include "Domain/src/DomainLayer/SerialProtocol.h"
 #include "utilities/Debug.h"
+#include "utilities/SourceWarnings.h"
 
 #include <QQueue>
 #include <QThread>
@@ -50,10 +51,7 @@ enum class Command : quint8
     SendPing = 0x7E
 };
 
-void warn(int line, const QString& text)
-{
-    Utilities::Debug::warningMessage(__FILE__, line, text);
-}
+const Utilities::SourceWarnings warn(QStringLiteral(__FILE__));
 
 bool isValid(unsigned char channel)
 {

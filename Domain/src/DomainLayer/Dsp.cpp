@@ -6,6 +6,7 @@
 #include "Domain/src/DomainLayer/AbstractButtons.h"
 #include "Domain/src/DomainLayer/DspPort.h"
 #include "utilities/Debug.h"
+#include "utilities/SourceWarnings.h"
 
 #include <QDataStream>
 #include <QDeadlineTimer>
@@ -81,10 +82,7 @@ bool waitUnlocked(QWaitCondition& condition, QMutex& mutex, const QDeadlineTimer
     return woken;
 }
 
-void warn(int line, const QString& text)
-{
-    Debug::warningMessage(__FILE__, line, text);
-}
+const Utilities::SourceWarnings warn(QStringLiteral(__FILE__));
 
 } // namespace
 

@@ -4,6 +4,7 @@
 #include "Domain/src/DomainLayer/SerialPort.h"
 
 #include "utilities/Debug.h"
+#include "utilities/SourceWarnings.h"
 
 #include <QByteArray>
 #include <QCoreApplication>
@@ -46,10 +47,7 @@ constexpr std::size_t chunkSize = 46;
 /// With this much unread the line is left to wait in the driver.
 constexpr qsizetype fullBuffer = 256 * 1024;
 
-void warn(int line, const QString& text)
-{
-    Utilities::Debug::warningMessage(__FILE__, line, text);
-}
+const Utilities::SourceWarnings warn(QStringLiteral(__FILE__));
 
 /// The C library's text for an error, the thread-safe way.
 QString errorText(int error)

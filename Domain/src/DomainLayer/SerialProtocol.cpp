@@ -4,7 +4,7 @@
 #include "Domain/src/DomainLayer/SerialProtocol.h"
 
 #include "Domain/src/DomainLayer/FrameParser.h"
-#include "utilities/Debug.h"
+#include "utilities/SourceWarnings.h"
 
 #include <QFile>
 #include <QtEndian>
@@ -25,7 +25,7 @@ constexpr qsizetype chunkSize = 4096;
 
 using Outcome = FrameParser::Outcome;
 
-const QString sourceFile = QStringLiteral(__FILE__);
+const Utilities::SourceWarnings warn(QStringLiteral(__FILE__));
 
 struct Refusal
 {
@@ -45,11 +45,6 @@ constexpr auto firstRefusal = static_cast<std::size_t>(Outcome::InvalidHeaderChe
 static_assert(static_cast<std::size_t>(Outcome::PayloadTooLong) == firstRefusal + 1);
 static_assert(static_cast<std::size_t>(Outcome::InvalidDataChecksum) == firstRefusal + 2);
 static_assert(static_cast<std::size_t>(Outcome::MissingEndOfPacket) == firstRefusal + 3);
-
-void warn(int line, const QString& text)
-{
-    Utilities::Debug::warningMessage(sourceFile, line, text);
-}
 
 void warnOfRefusal(Outcome reason)
 {
