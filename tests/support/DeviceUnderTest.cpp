@@ -6,6 +6,8 @@
 #include "virtual-device/sandbox/DeviceFolder.h"
 
 #include <QCoreApplication>
+#include <QDeadlineTimer>
+#include <QFile>
 #include <QJsonArray>
 #include <QJsonDocument>
 #include <QJsonObject>
@@ -39,6 +41,8 @@ DeviceUnderTest::DeviceUnderTest()
     });
     QObject::connect(&runner, &QProcess::readyReadStandardError, &runner,
                      [this] { written += runner.readAllStandardError(); });
+    QObject::connect(&connection, &VirtualDevice::ControlClient::notified, &connection,
+                     [this](const QString&, const QJsonObject& event) { kept.append(event); });
 }
 
 DeviceUnderTest::~DeviceUnderTest()
@@ -46,19 +50,36 @@ DeviceUnderTest::~DeviceUnderTest()
     stop();
 }
 
-bool DeviceUnderTest::start(const QStringList& arguments)
+bool DeviceUnderTest::start(const QStringList& arguments, std::chrono::milliseconds limit)
 {
-    const QString program = qEnvironmentVariable("IMMUNITYRIG_BUILD") + "/virtual-device/virtual-device";
+    const QDeadlineTimer deadline(limit);
+    return begin(arguments) && waitReady(std::chrono::milliseconds(deadline.remainingTime()));
+}
+
+bool DeviceUnderTest::begin(const QStringList& arguments)
+{
     stop();
     ready.clear();
     written.clear();
+    kept.clear();
+    QFile::remove(scratch.filePath("output"));
     deviceName = uniqueName();
-    runner.start(program, QStringList{"run", "--name", deviceName} + arguments);
+    runner.start(
+        qEnvironmentVariable("IMMUNITYRIG_BUILD") + "/virtual-device/virtual-device",
+        QStringList{"run", "--name", deviceName, "--state", stateFile({}), "--output", scratch.filePath("output")} +
+            arguments);
+    const QString path = VirtualDevice::DeviceFolder::controlSocket(deviceName);
+    return QTest::qWaitFor([&] { return connectTo(path) || runner.state() == QProcess::NotRunning; },
+                           static_cast<int>(std::chrono::milliseconds(usual).count())) &&
+           (connection.isOpen() || fail("the device did not start: " + output()));
+}
+
+bool DeviceUnderTest::waitReady(std::chrono::milliseconds limit)
+{
     const bool isOver = QTest::qWaitFor([this] { return !ready.isEmpty() || runner.state() == QProcess::NotRunning; },
-                                        static_cast<int>(std::chrono::milliseconds(startLimit).count()));
-    if (!isOver || ready.isEmpty())
-        return fail(QStringLiteral("%1 did not get ready (%2): %3").arg(program, runner.errorString(), output()));
-    return connectTo(VirtualDevice::DeviceFolder::controlSocket(deviceName));
+                                        static_cast<int>(limit.count()));
+    return (isOver && !ready.isEmpty()) ||
+           fail(QStringLiteral("no window in time (%1): %2").arg(runner.errorString(), output()));
 }
 
 bool DeviceUnderTest::attach()
@@ -140,9 +161,49 @@ qint64 DeviceUnderTest::logMark()
 QStringList DeviceUnderTest::logTexts(qint64 after)
 {
     QStringList texts;
-    for (const auto& line : call("log", {{"after", after}}).result.toArray())
-        texts.append(line.toObject().value("text").toString());
+    for (const auto& line : logLines(after))
+        texts.append(line.value("text").toString());
     return texts;
+}
+
+QList<QJsonObject> DeviceUnderTest::logLines(qint64 after)
+{
+    QList<QJsonObject> lines;
+    for (const auto& line : call("log", {{"after", after}}).result.toArray())
+        lines.append(line.toObject());
+    return lines;
+}
+
+bool DeviceUnderTest::follow()
+{
+    forgetEvents();
+    return call("events").isOk();
+}
+
+QStringList DeviceUnderTest::regionsThatTurned(const QString& colour) const
+{
+    QStringList names;
+    for (const auto& event : kept)
+        if (event.value("kind") == "region" && event.value("colour") == colour)
+            names.append(event.value("name").toString());
+    names.removeDuplicates();
+    return names;
+}
+
+QString DeviceUnderTest::programOutput() const
+{
+    QFile file(scratch.filePath("output"));
+    return file.open(QIODevice::ReadOnly) ? QString::fromUtf8(file.readAll()) : QString();
+}
+
+bool DeviceUnderTest::waitOutput(const QString& text, std::chrono::milliseconds limit) const
+{
+    return QTest::qWaitFor([&] { return programOutput().contains(text); }, static_cast<int>(limit.count()));
+}
+
+std::optional<ProgramProcess> DeviceUnderTest::program() const
+{
+    return ProgramProcess::below(runner.processId(), "immunityrig");
 }
 
 QImage DeviceUnderTest::screenshot()

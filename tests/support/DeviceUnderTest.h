@@ -3,15 +3,19 @@
 
 #pragma once
 
+#include "tests/support/ProgramProcess.h"
 #include "virtual-device/control/ControlClient.h"
 
 #include <QImage>
+#include <QJsonObject>
 #include <QJsonValue>
 #include <QProcess>
 #include <QString>
 #include <QStringList>
+#include <QTemporaryDir>
 
 #include <chrono>
+#include <optional>
 
 namespace TestSupport
 {
@@ -40,8 +44,12 @@ public:
     DeviceUnderTest(const DeviceUnderTest&) = delete;
     DeviceUnderTest& operator=(const DeviceUnderTest&) = delete;
 
-    /// Further arguments of `virtual-device run`. Returns when the window stands.
-    [[nodiscard]] bool start(const QStringList& arguments = {});
+    /// Further arguments of `virtual-device run`. Returns when the window stands, and false when it does not in time.
+    [[nodiscard]] bool start(const QStringList& arguments = {}, std::chrono::milliseconds limit = startLimit);
+    /// The first half of `start`: returns when the device can be spoken to, with or without a window.
+    [[nodiscard]] bool begin(const QStringList& arguments = {});
+    /// The other half.
+    [[nodiscard]] bool waitReady(std::chrono::milliseconds limit = startLimit);
     /// Speaks to the device in whose `virtual-device exec` the test runs ($VIRTUAL_DEVICE_CONTROL).
     [[nodiscard]] bool attach();
     /// As Ctrl-C does; kills what does not end.
@@ -71,8 +79,25 @@ public:
     /// The number of the newest log line, for `waitLog` and `logTexts`.
     [[nodiscard]] qint64 logMark();
     [[nodiscard]] QStringList logTexts(qint64 after = 0);
+    /// As the control socket gives them: number, priority, identity, text.
+    [[nodiscard]] QList<QJsonObject> logLines(qint64 after = 0);
     /// Null when it fails.
     [[nodiscard]] QImage screenshot();
+
+    /// From now on the device's events are kept; what came before the device's end stays readable after it.
+    [[nodiscard]] bool follow();
+    void forgetEvents() { kept.clear(); }
+    [[nodiscard]] const QList<QJsonObject>& events() const { return kept; }
+    /// The regions that have turned this colour since.
+    [[nodiscard]] QStringList regionsThatTurned(const QString& colour) const;
+
+    /// Where the files of the device are that the program finds in its root folder.
+    [[nodiscard]] QString stateFile(const QString& path) const { return scratch.filePath("state/" + path); }
+    /// What the program itself has printed, both streams.
+    [[nodiscard]] QString programOutput() const;
+    [[nodiscard]] bool waitOutput(const QString& text, std::chrono::milliseconds limit = usual) const;
+    /// The program's own process in the device's sandbox.
+    [[nodiscard]] std::optional<ProgramProcess> program() const;
 
     /// Any other request; `error()` is set when it is refused.
     VirtualDevice::ControlReply call(const QString& method, const QJsonObject& params = {});
@@ -97,6 +122,8 @@ private:
     QString ready;
     QString problem;
     QByteArray written;
+    QList<QJsonObject> kept;
+    QTemporaryDir scratch;
     QProcess runner;
     VirtualDevice::ControlClient connection;
 };

@@ -2,33 +2,24 @@
 // SPDX-License-Identifier: MIT
 
 #include "tests/support/DeviceUnderTest.h"
+#include "tests/support/ScreenHealth.h"
+#include "tests/support/ScreenText.h"
 
+#include <QRegularExpression>
 #include <QTest>
 
-#include <array>
-
 using TestSupport::DeviceUnderTest;
+using TestSupport::ScreenHealth;
+using TestSupport::ScreenText;
 
 #define REQUIRE(call) QVERIFY2(call, qPrintable(device.error()))
 
 namespace
 {
 
-struct Expected
-{
-    const char* region;
-    const char* colour;
-};
-
-/// What an engineer sees while nothing is broken.
-constexpr std::array healthy{
-    Expected{"rtc", "white"},        Expected{"key.soft1", "white"},  Expected{"key.soft2", "white"},
-    Expected{"key.soft3", "white"},  Expected{"key.sel", "white"},    Expected{"key.up", "white"},
-    Expected{"key.down", "white"},   Expected{"key.left", "white"},   Expected{"key.right", "white"},
-    Expected{"key.power", "white"},  Expected{"usb-device", "green"}, Expected{"usb-gadget", "green"},
-    Expected{"fuel-gauge", "white"}, Expected{"trigger", "green"},    Expected{"sd-card", "green"},
-    Expected{"rf.beacon", "green"},  Expected{"rf.radios", "green"},
-};
+// Inside the fields' frames.
+constexpr QRect clockField(4, 4, 232, 22);
+constexpr QRect unknownKeyLabel(61, 78, 168, 14);
 
 } // namespace
 
@@ -38,6 +29,9 @@ class ScreenSystemTest : public QObject
 {
     Q_OBJECT
 
+public:
+    static void initMain() { ScreenText::prepare(); }
+
 private slots:
     void initTestCase();
     void init();
@@ -45,36 +39,25 @@ private slots:
     void everythingIsHealthyAtStart();
     void oneFaultTurnsOneRegionRedAndItComesBack_data();
     void oneFaultTurnsOneRegionRedAndItComesBack();
-    void gaugeFollowsTheBattery_data();
-    void gaugeFollowsTheBattery();
-    void oddGaugeFilesLeaveTheWindowAlive_data();
-    void oddGaugeFilesLeaveTheWindowAlive();
     void clockTicks();
+    void readOnlyCardThatHoldsItsFileStaysGreen();
+    void deadPowerLatchLeavesThePowerKeyAnswering();
+    void unknownKeyShowsItsNumber();
+    void percentSignsOfForeignTextAreLoggedAsTheyCame_data();
+    void percentSignsOfForeignTextAreLoggedAsTheyCame();
     void stalledLogLeavesTheWindowAlive();
     void clockStaysRedAfterOneFailedRead();
 
 private:
-    [[nodiscard]] bool becomesHealthy();
-    [[nodiscard]] QString differencesFromHealthy(const QString& except = {});
+    [[nodiscard]] bool comesToShow(const QRect& field, const QString& text);
 
     DeviceUnderTest device;
 };
 
-bool ScreenSystemTest::becomesHealthy()
+bool ScreenSystemTest::comesToShow(const QRect& field, const QString& text)
 {
-    return std::all_of(healthy.begin(), healthy.end(),
-                       [this](const Expected& row) { return device.waitRegion(row.region, row.colour); });
-}
-
-QString ScreenSystemTest::differencesFromHealthy(const QString& except)
-{
-    QStringList differences;
-    for (const auto& row : healthy) {
-        const QString colour = device.regionColour(row.region);
-        if (row.region != except && colour != row.colour)
-            differences.append(QStringLiteral("%1 is %2").arg(row.region, colour));
-    }
-    return differences.join(u", ");
+    return QTest::qWaitFor([&] { return ScreenText::isAt(device.screenshot(), field, text, ScreenText::named()); },
+                           20000);
 }
 
 void ScreenSystemTest::initTestCase()
@@ -84,12 +67,12 @@ void ScreenSystemTest::initTestCase()
 
 void ScreenSystemTest::init()
 {
-    REQUIRE(becomesHealthy());
+    REQUIRE(ScreenHealth::isReached(device));
 }
 
 void ScreenSystemTest::everythingIsHealthyAtStart()
 {
-    QCOMPARE(differencesFromHealthy(), QString());
+    QCOMPARE(ScreenHealth::differences(device), QString());
 }
 
 void ScreenSystemTest::oneFaultTurnsOneRegionRedAndItComesBack_data()
@@ -108,7 +91,9 @@ void ScreenSystemTest::oneFaultTurnsOneRegionRedAndItComesBack_data()
     row("mode binary", "usb.gadget_content", "binary", "normal", "usb-gadget");
     row("mode 1 MB", "usb.gadget_content", "huge", "normal", "usb-gadget");
     row("mode unreadable", "usb.gadget_fault", "EIO", "none", "usb-gadget");
+    row("HID entry unreadable", "usb.hid_fault", "ENOENT", "none", "usb-device");
     row("card pulled", "sd.present", false, true, "sd-card");
+    row("card's entry dangling", "sd.block_fault", "dangling", "none", "sd-card");
     row("data partition broken", "sd.fault", "EIO", "none", "sd-card");
     row("no triggers", "trigger.period", 0, 500, "trigger");
     row("no radio line", "radioline.period", 0, 1000, "rf.radios");
@@ -121,65 +106,107 @@ void ScreenSystemTest::oneFaultTurnsOneRegionRedAndItComesBack()
     QFETCH(const QJsonValue, broken);
     QFETCH(const QJsonValue, whole);
     QFETCH(const QString, region);
+    REQUIRE(device.follow());
     REQUIRE(device.set(control, broken));
     REQUIRE(device.waitRegion(region, "red"));
-    QCOMPARE(differencesFromHealthy(region), QString());
+    REQUIRE(ScreenHealth::passesARound(device));
+    QCOMPARE(device.regionColour(region), "red");
+    QCOMPARE(ScreenHealth::differences(device, {region}), QString());
+    QCOMPARE(device.regionsThatTurned("red"), QStringList(region));
+    QCOMPARE(device.regionsThatTurned("green"), QStringList());
     REQUIRE(device.set(control, whole));
     REQUIRE(device.waitRegion(region, "green"));
-}
-
-void ScreenSystemTest::gaugeFollowsTheBattery_data()
-{
-    QTest::addColumn<QString>("control");
-    QTest::addColumn<QRect>("area");
-    QTest::addRow("voltage") << "battery.voltage" << QRect(5, 139, 230, 25);
-    QTest::addRow("current") << "battery.current" << QRect(5, 164, 230, 25);
-}
-
-/// What the numbers read is checked where the widgets can be asked; here the picture follows the gauge there and back.
-void ScreenSystemTest::gaugeFollowsTheBattery()
-{
-    QFETCH(const QString, control);
-    QFETCH(const QRect, area);
-    const QJsonValue before = device.get(control);
-    const QImage first = device.screenshot().copy(area);
-    REQUIRE(device.set(control, 3333333));
-    QTRY_VERIFY_WITH_TIMEOUT(device.screenshot().copy(area) != first, 20000);
-    REQUIRE(device.set(control, before));
-    QTRY_VERIFY_WITH_TIMEOUT(device.screenshot().copy(area) == first, 20000);
-}
-
-void ScreenSystemTest::oddGaugeFilesLeaveTheWindowAlive_data()
-{
-    QTest::addColumn<QString>("control");
-    QTest::addColumn<QString>("value");
-    for (const auto* file : {"voltage", "current"}) {
-        for (const auto* content : {"empty", "binary", "huge", "no-newline"})
-            QTest::addRow("%s %s", file, content) << QStringLiteral("battery.%1_content").arg(file) << content;
-        for (const auto* fault : {"EIO", "ENODATA", "ENOENT", "EACCES"})
-            QTest::addRow("%s %s", file, fault) << QStringLiteral("battery.%1_fault").arg(file) << fault;
-    }
-}
-
-void ScreenSystemTest::oddGaugeFilesLeaveTheWindowAlive()
-{
-    QFETCH(const QString, control);
-    QFETCH(const QString, value);
-    const QJsonValue whole = device.get(control);
-    REQUIRE(device.set(control, value));
-    REQUIRE(device.press("Up"));
-    REQUIRE(device.waitRegion("key.up", "green"));
-    REQUIRE(device.release("Up"));
-    REQUIRE(device.waitRegion("key.up", "white"));
-    QCOMPARE(differencesFromHealthy(), QString());
-    REQUIRE(device.set(control, whole));
+    QCOMPARE(ScreenHealth::differences(device), QString());
+    QCOMPARE(device.regionsThatTurned("red"), QStringList(region));
+    QCOMPARE(device.regionsThatTurned("green"), QStringList(region));
 }
 
 void ScreenSystemTest::clockTicks()
 {
-    const QRect area(0, 0, 240, 30);
-    const QImage first = device.screenshot().copy(area);
-    QTRY_VERIFY_WITH_TIMEOUT(device.screenshot().copy(area) != first, 20000);
+    constexpr qint64 afternoon = 1299510245;
+    REQUIRE(device.set("rtc.running", false));
+    REQUIRE(device.set("rtc.time", afternoon));
+    QVERIFY(comesToShow(clockField, "3/7/11 3:04:05 PM"));
+    REQUIRE(device.set("rtc.time", afternoon + 12 * 3600 + 1));
+    QVERIFY(comesToShow(clockField, "3/8/11 3:04:06 AM"));
+    REQUIRE(device.set("rtc.running", true));
+    REQUIRE(ScreenHealth::passesARound(device));
+    QVERIFY(!ScreenText::isAt(device.screenshot(), clockField, "3/8/11 3:04:06 AM", ScreenText::named()));
+}
+
+/// The probe file is written once, when it is missing, and only read from then on.
+void ScreenSystemTest::readOnlyCardThatHoldsItsFileStaysGreen()
+{
+    REQUIRE(device.follow());
+    for (const auto* const refusal : {"sd.readonly", "sd.full"}) {
+        REQUIRE(device.set(refusal, true));
+        REQUIRE(ScreenHealth::passesARound(device));
+        REQUIRE(device.set(refusal, false));
+    }
+    QCOMPARE(device.regionsThatTurned("red"), QStringList());
+    QCOMPARE(ScreenHealth::differences(device), QString());
+    QFile probe(device.stateFile("mnt/data/testfile"));
+    QVERIFY(probe.open(QIODevice::ReadOnly));
+    QCOMPARE(probe.readAll(), "Vantor Tamberly");
+}
+
+void ScreenSystemTest::deadPowerLatchLeavesThePowerKeyAnswering()
+{
+    REQUIRE(device.set("led.fault", "EACCES"));
+    const qint64 writes = device.get("led.writes").toInteger();
+    REQUIRE(device.press("Power"));
+    REQUIRE(device.waitRegion("key.power", "green"));
+    QVERIFY(device.waitOutput("Cannot open power latch file"));
+    REQUIRE(device.release("Power"));
+    REQUIRE(device.waitRegion("key.power", "white"));
+    QCOMPARE(ScreenHealth::differences(device), QString());
+    QCOMPARE(device.get("led.writes").toInteger(), writes);
+    REQUIRE(device.set("led.fault", "none"));
+    REQUIRE(device.tap("Power"));
+    REQUIRE(device.waitControl("led.writes", writes + 1));
+}
+
+void ScreenSystemTest::unknownKeyShowsItsNumber()
+{
+    REQUIRE(device.press("Escape"));
+    REQUIRE(device.waitRegion("key.unknown", "green"));
+    QVERIFY(comesToShow(unknownKeyLabel, "Unknown key: 16777216"));
+    REQUIRE(device.release("Escape"));
+    REQUIRE(device.waitRegion("key.unknown", "white"));
+    QVERIFY(comesToShow(unknownKeyLabel, "Unknown key: 16777216"));
+}
+
+void ScreenSystemTest::percentSignsOfForeignTextAreLoggedAsTheyCame_data()
+{
+    QTest::addColumn<QString>("control");
+    QTest::addColumn<QString>("sent");
+    QTest::addColumn<QString>("source");
+    QTest::addRow("burst on the radio line") << "radio.text"
+                                             << "%n%s"
+                                             << "BeaconProcessor\\.cpp, \\d+, ";
+    QTest::addRow("placeholders on the radio line") << "radio.text"
+                                                    << "%1 %m %%"
+                                                    << "BeaconProcessor\\.cpp, \\d+, ";
+    QTest::addRow("log string of the DSP") << "dsp.log"
+                                           << "%n%s"
+                                           << "Dsp\\.cpp, \\d+, DSP Log: ";
+}
+
+void ScreenSystemTest::percentSignsOfForeignTextAreLoggedAsTheyCame()
+{
+    QFETCH(const QString, control);
+    QFETCH(const QString, sent);
+    QFETCH(const QString, source);
+    const qint64 mark = device.logMark();
+    REQUIRE(device.set(control, sent));
+    REQUIRE(device.waitLog(sent, DeviceUnderTest::usual, mark));
+    const QString whole = "Domain/src/DomainLayer/" + source + QRegularExpression::escape(sent);
+    const auto lines = device.logLines(mark);
+    QCOMPARE(lines.size(), 1);
+    const QString text = lines.front().value("text").toString();
+    QVERIFY2(QRegularExpression(QRegularExpression::anchoredPattern(whole)).match(text).hasMatch(), qPrintable(text));
+    QCOMPARE(lines.front().value("priority").toInt(), 4);
+    QCOMPARE(ScreenHealth::differences(device), QString());
 }
 
 void ScreenSystemTest::stalledLogLeavesTheWindowAlive()
@@ -202,7 +229,7 @@ void ScreenSystemTest::clockStaysRedAfterOneFailedRead()
 {
     REQUIRE(device.set("rtc.fault", "EIO"));
     REQUIRE(device.waitRegion("rtc", "red"));
-    QCOMPARE(differencesFromHealthy("rtc"), QString());
+    QCOMPARE(ScreenHealth::differences(device, {"rtc"}), QString());
     REQUIRE(device.set("rtc.fault", "none"));
     const QRect area(0, 0, 240, 30);
     const QImage first = device.screenshot().copy(area);
@@ -210,5 +237,5 @@ void ScreenSystemTest::clockStaysRedAfterOneFailedRead()
     QCOMPARE(device.regionColour("rtc"), "red");
 }
 
-QTEST_GUILESS_MAIN(ScreenSystemTest)
+QTEST_MAIN(ScreenSystemTest)
 #include "ScreenSystemTest.moc"

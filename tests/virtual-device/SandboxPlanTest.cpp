@@ -3,6 +3,7 @@
 
 #include "virtual-device/sandbox/SandboxPlan.h"
 
+#include <QRegularExpression>
 #include <QTest>
 
 #include <algorithm>
@@ -39,6 +40,8 @@ private slots:
     void programGetsAFixedEnvironmentAndNothingElse();
     void planWinsOverTheFixedEnvironment();
     void ownCommandInheritsTheEnvironment();
+    void filesThatSanitizerOptionsNameAreBroughtIn_data();
+    void filesThatSanitizerOptionsNameAreBroughtIn();
     void commandRunsAsItIsWithoutAScreen();
     void screenIsRelayedBesideTheUnchangedCommand();
 };
@@ -105,6 +108,45 @@ void SandboxPlanTest::ownCommandInheritsTheEnvironment()
     SandboxPlan plan;
     plan.inheritsEnvironment = true;
     QVERIFY(!argumentsFor(plan).contains("--clearenv"));
+}
+
+void SandboxPlanTest::filesThatSanitizerOptionsNameAreBroughtIn_data()
+{
+    QTest::addColumn<QByteArray>("options");
+    QTest::addColumn<QStringList>("files");
+    QTest::addRow("one among others") << QByteArray("a=1:suppressions=/a/leaks:b=2") << QStringList{"/a/leaks"};
+    QTest::addRow("blanks between") << QByteArray("a=1 suppressions=/a/leaks b=2") << QStringList{"/a/leaks"};
+    QTest::addRow("quoted") << QByteArray("suppressions=\"/a b/leaks\":b=2") << QStringList{"/a b/leaks"};
+    QTest::addRow("single quotes") << QByteArray("b=2,suppressions='/a:b/leaks'") << QStringList{"/a:b/leaks"};
+    QTest::addRow("relative") << QByteArray("suppressions=leaks") << QStringList{};
+    QTest::addRow("empty") << QByteArray("suppressions=:b=2") << QStringList{};
+    QTest::addRow("another option's end") << QByteArray("print_suppressions=/a/leaks") << QStringList{};
+}
+
+/// Before the device's own binds, so that no option can cover what the device serves.
+void SandboxPlanTest::filesThatSanitizerOptionsNameAreBroughtIn()
+{
+    QFETCH(const QByteArray, options);
+    QFETCH(const QStringList, files);
+    SandboxPlan plan;
+    plan.add("/state", "/mnt", SandboxBind::Kind::Writable);
+    const auto without = [] {
+        for (const auto* const name : {"ASAN_OPTIONS", "LSAN_OPTIONS", "TSAN_OPTIONS", "UBSAN_OPTIONS"})
+            qunsetenv(name);
+    };
+    for (const auto* const name : {"ASAN_OPTIONS", "LSAN_OPTIONS", "TSAN_OPTIONS", "UBSAN_OPTIONS"}) {
+        without();
+        qputenv(name, options);
+        const auto arguments = argumentsFor(plan);
+        for (const auto& file : files) {
+            const auto bind = position(arguments, {"--ro-bind-try", file, file});
+            QVERIFY(bind >= 0 && bind < position(arguments, {"--bind", "/state", "/mnt"}));
+        }
+        QVERIFY(position(arguments, {"--setenv", name, options}) >= 0);
+        const auto binds = arguments.filter(QRegularExpression("\\A[^=]*leaks\\z"));
+        QCOMPARE(binds.size(), 2 * files.size());
+    }
+    without();
 }
 
 void SandboxPlanTest::commandRunsAsItIsWithoutAScreen()

@@ -65,6 +65,24 @@ public:
     QString readyLine;
 };
 
+/// A program for the device, in the shell's language.
+class Script
+{
+public:
+    explicit Script(const QString& text)
+    {
+        QFile file(path());
+        if (!file.open(QIODevice::WriteOnly) || file.write("#!/bin/sh\n" + text.toLocal8Bit() + '\n') < 0 ||
+            !file.setPermissions(QFile::ReadOwner | QFile::ExeOwner))
+            qFatal("%s: %s", qPrintable(path()), qPrintable(file.errorString()));
+    }
+
+    [[nodiscard]] QString path() const { return folder.filePath("program"); }
+
+private:
+    QTemporaryDir folder;
+};
+
 /// Processes of the host whose command line holds `text`, this one's aside.
 QStringList processesWith(const QString& text)
 {
@@ -118,6 +136,9 @@ private slots:
     void nextStartCleansUpAfterOneThatWasKilled();
     void programThatIsKilledEndsItWithAReason();
     void programThatFailsIsExplainedByItsLastWords();
+    void outputFileHoldsWhatTheProgramPrints();
+    void outputFileThatCannotBeMadeIsReported();
+    void sanitizerFindsItsOptionsAndItsSuppressions();
     void nameThatRunsIsRefused();
     void portIsTheOneAskedFor();
     void execPassesInputOutputAndStatus();
@@ -222,17 +243,53 @@ void VirtualDeviceCommandTest::programThatIsKilledEndsItWithAReason()
 void VirtualDeviceCommandTest::programThatFailsIsExplainedByItsLastWords()
 {
     REQUIRE_FUSE();
-    const QTemporaryDir folder;
-    QFile script(folder.filePath("program"));
-    QVERIFY(script.open(QIODevice::WriteOnly));
-    script.write("#!/bin/sh\nfor i in 1 2 3 4 5 6 7 8 9 10 11; do echo line $i >&2; done; exit 4\n");
-    script.close();
-    QVERIFY(script.setPermissions(QFile::ReadOwner | QFile::ExeOwner));
-    const auto outcome = virtualDevice({"run", "--program", script.fileName()});
+    const Script script("for i in 1 2 3 4 5 6 7 8 9 10 11; do echo line $i >&2; done; exit 4");
+    const auto outcome = virtualDevice({"run", "--program", script.path()});
     QCOMPARE(outcome.status, 4);
     QCOMPARE(outcome.output, QString());
     QCOMPARE(outcome.errors, "line 2\nline 3\nline 4\nline 5\nline 6\nline 7\nline 8\nline 9\nline 10\nline 11\n"
                              "virtual-device: the program ended with status 4\n");
+}
+
+void VirtualDeviceCommandTest::outputFileHoldsWhatTheProgramPrints()
+{
+    REQUIRE_FUSE();
+    const Script script("echo out; echo error >&2; printf unfinished; exit 4");
+    const QTemporaryDir folder;
+    const QString file = folder.filePath("output");
+    QCOMPARE(virtualDevice({"run", "--program", script.path(), "--output", file}).status, 4);
+    QFile output(file);
+    QVERIFY(output.open(QIODevice::ReadOnly));
+    QCOMPARE(output.readAll(), "out\nerror\nunfinished\n");
+}
+
+void VirtualDeviceCommandTest::outputFileThatCannotBeMadeIsReported()
+{
+    const Script script("exit 0");
+    const auto outcome = virtualDevice({"run", "--program", script.path(), "--output", "/nothing/output"});
+    QCOMPARE(outcome.status, 1);
+    QVERIFY2(outcome.errors.startsWith("virtual-device: /nothing/output: "), qPrintable(outcome.errors));
+}
+
+/// The program's surroundings hold nothing else of the host: what the options name is brought in, to be read only.
+void VirtualDeviceCommandTest::sanitizerFindsItsOptionsAndItsSuppressions()
+{
+    REQUIRE_FUSE();
+    const QTemporaryDir folder;
+    QFile suppressions(folder.filePath("leaks"));
+    QVERIFY(suppressions.open(QIODevice::WriteOnly));
+    suppressions.write("leak:nothing");
+    suppressions.close();
+    const QByteArray before = qgetenv("LSAN_OPTIONS");
+    qputenv("LSAN_OPTIONS", "suppressions=" + suppressions.fileName().toLocal8Bit() + ":print_suppressions=0");
+    const Script script("echo \"$LSAN_OPTIONS\"; cat " + suppressions.fileName() + "; echo; ls " + folder.path() +
+                        "; (echo >> " + suppressions.fileName() + ") 2>/dev/null && echo writable; exit 4");
+    const auto outcome = virtualDevice({"run", "--program", script.path()});
+    qputenv("LSAN_OPTIONS", before);
+    QCOMPARE(outcome.status, 4);
+    QCOMPARE(outcome.errors, "suppressions=" + suppressions.fileName() +
+                                 ":print_suppressions=0\nleak:nothing\nleaks\n" +
+                                 "virtual-device: the program ended with status 4\n");
 }
 
 void VirtualDeviceCommandTest::nameThatRunsIsRefused()

@@ -1,7 +1,11 @@
 # SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 # SPDX-License-Identifier: MIT
 
-add_library(DeviceTestSupport STATIC support/DeviceUnderTest.cpp support/DeviceUnderTest.h)
+add_library(DeviceTestSupport STATIC
+  support/DeviceUnderTest.cpp support/DeviceUnderTest.h
+  support/ProgramProcess.cpp support/ProgramProcess.h
+  support/ScreenHealth.cpp support/ScreenHealth.h
+  support/ScreenText.cpp support/ScreenText.h)
 target_link_libraries(DeviceTestSupport PUBLIC ProjectOptions TestSupport VirtualDevice)
 target_precompile_headers(DeviceTestSupport REUSE_FROM TestSupport)
 

@@ -8,6 +8,7 @@
 #include <QCommandLineParser>
 #include <QCoreApplication>
 #include <QDir>
+#include <QFile>
 #include <QFileInfo>
 #include <QTextStream>
 
@@ -43,6 +44,19 @@ void announce(const Device& device)
     QTextStream(stdout) << "ready: VNC " << device.vncAddress() << ", control " << device.controlSocket() << Qt::endl;
 }
 
+/// Each line as it comes: whoever reads the file while the program runs sees what it has printed so far.
+std::optional<QString> keepOutput(const QCommandLineParser& parser, QFile& file, Sandbox& program)
+{
+    if (!parser.isSet("output"))
+        return std::nullopt;
+    file.setFileName(parser.value("output"));
+    if (!file.open(QIODevice::WriteOnly | QIODevice::Unbuffered))
+        return QStringLiteral("%1: %2").arg(file.fileName(), file.errorString());
+    QObject::connect(&program, &Sandbox::outputReceived, &file,
+                     [&file](const QByteArray& line) { file.write(line + '\n'); });
+    return std::nullopt;
+}
+
 /// A program that fails says why on its error output, which nobody sees while it runs.
 void explainEnd(Sandbox& program, int status)
 {
@@ -61,7 +75,8 @@ int runCommand(const QStringList& arguments)
     parser.setApplicationDescription("Runs the program on a virtual device until it ends or is interrupted.");
     DeviceSession::addOptions(parser);
     parser.addOptions({{"vnc-port", "Offer the screen on this port of 127.0.0.1 instead of a free one.", "port"},
-                       {"program", "Run this program instead of the one of this build.", "file"}});
+                       {"program", "Run this program instead of the one of this build.", "file"},
+                       {"output", "Write what the program prints, both streams, to this file.", "file"}});
     DeviceOptions options;
     if (const auto status = DeviceSession::parse(parser, arguments, options))
         return *status;
@@ -72,7 +87,10 @@ int runCommand(const QStringList& arguments)
         return DeviceSession::complain("wrong use: see virtual-device run --help", ExitStatus::wrongUse);
     if (const auto problem = chooseProgram(parser, options))
         return DeviceSession::complain(*problem, ExitStatus::failure);
+    QFile output;
     DeviceSession session(options);
+    if (const auto problem = keepOutput(parser, output, session.device().program()))
+        return DeviceSession::complain(*problem, ExitStatus::failure);
     std::optional<LiveTable> table;
     QObject::connect(&session.device(), &Device::ready, [&] {
         announce(session.device());

@@ -3,6 +3,8 @@
 
 #include "virtual-device/sandbox/SandboxPlan.h"
 
+#include <QRegularExpression>
+
 #include <array>
 #include <initializer_list>
 
@@ -76,6 +78,23 @@ const QMap<QString, QString> fixedEnvironment{
 /// What a sanitizer's build of the program is steered by; harmless to every other build.
 constexpr std::array passedOn{"ASAN_OPTIONS", "LSAN_OPTIONS", "TSAN_OPTIONS", "UBSAN_OPTIONS"};
 
+/// The files that those options name. A sanitizer looks for each by the same path inside.
+QStringList suppressionFiles()
+{
+    static const QRegularExpression option(
+        QStringLiteral(R"re((?:^|[\s:,])suppressions=(?|"([^"]*)"|'([^']*)'|([^\s:,]*)))re"));
+    QStringList files;
+    for (const char* name : passedOn) {
+        auto matches = option.globalMatch(qEnvironmentVariable(name));
+        while (matches.hasNext()) {
+            const QString file = matches.next().captured(1);
+            if (file.startsWith(u'/') && !files.contains(file))
+                files.append(file);
+        }
+    }
+    return files;
+}
+
 QString bindOption(const SandboxBind& bind)
 {
     QString option;
@@ -130,6 +149,9 @@ void SandboxPlan::add(const QString& source, const QString& target, SandboxBind:
 QStringList bubblewrapArguments(const SandboxPlan& plan, int statusDescriptor)
 {
     QStringList arguments = isolation + system;
+    // Before the device's own binds, which they must not cover.
+    for (const auto& file : suppressionFiles())
+        arguments += {QStringLiteral("--ro-bind-try"), file, file};
     for (const auto& bind : plan.binds)
         arguments += {bindOption(bind), bind.source, bind.target};
     arguments += environmentArguments(plan);
