@@ -8,6 +8,7 @@
 
 #include <QElapsedTimer>
 #include <QMetaMethod>
+#include <QScopeGuard>
 #include <QSemaphore>
 #include <QTest>
 #include <QThread>
@@ -507,7 +508,10 @@ private slots:
         std::atomic<int> announced = 0;
         std::atomic<int> handled = 0;
         QSemaphore turns; // without one the worker stands still after each message
-        const auto run = qScopeGuard([&] { turns.release(2 * backlog); });
+        const auto end = qScopeGuard([&] {
+            turns.release(2 * backlog);
+            dsp.reset(); // with its thread, before what the thread counts with
+        });
         connect(
             port.get(), &DspPort::readyRead, this, [&] { ++announced; }, Qt::DirectConnection);
         connect(

@@ -12,6 +12,7 @@
 
 #include <QElapsedTimer>
 #include <QFile>
+#include <QScopeGuard>
 #include <QTest>
 #include <QThread>
 
@@ -279,6 +280,10 @@ private slots:
             port.get(), &Domain::DspPort::readyRead, this, [&] { ++announced; }, Qt::DirectConnection);
         std::atomic<int> handled = 0;
         std::atomic<bool> slow = true;
+        const auto end = qScopeGuard([&] {
+            slow = false;
+            dsp.reset(); // with its thread, before what the thread counts with
+        });
         connect(
             dsp.get(), &Domain::Dsp::sensorDataReceived, dsp.get(),
             [&] {
@@ -295,9 +300,7 @@ private slots:
             QVERIFY(announced - handled > backlog / 2);
         }
         QVERIFY(dsp->setReceiverEnableTest(0));
-        slow = false;
         QCOMPARE(number("dsp.messages_lost"), 0);
-        disconnect(dsp.get(), &Domain::Dsp::sensorDataReceived, dsp.get(), nullptr);
     }
 
     void aDspThatGoesAwayFailsCommandsAndNothingElse()
