@@ -3,13 +3,10 @@
 
 #include "tests/support/DeviceUnderTest.h"
 #include "virtual-device/control/ControlClient.h"
-#include "virtual-device/sandbox/DeviceFolder.h"
 
-#include <QFileInfo>
 #include <QJsonArray>
 #include <QJsonObject>
 #include <QTest>
-#include <QTimer>
 
 #include <array>
 #include <utility>
@@ -69,11 +66,9 @@ private:
     QStringList toldAtStart; ///< the radio alone: the DSP's part may come before the listener
 };
 
-/// False as long as there is no device that could be heard.
 bool RadioSystemTest::listen()
 {
-    const QString socket = VirtualDevice::DeviceFolder::controlSocket(device.name());
-    if (device.name().isEmpty() || !QFileInfo::exists(socket) || listener.open(socket))
+    if (listener.open(device.controlSocket()))
         return false;
     connect(&listener, &ControlClient::notified, this, [this](const QString&, const QJsonObject& event) {
         note(event.value("name").toString(), event.value("value"));
@@ -108,14 +103,9 @@ bool RadioSystemTest::answers(const char* key, const char* region)
 /// Acknowledged late, the first command is still the last one when the listener comes.
 void RadioSystemTest::initTestCase()
 {
-    QTimer attempts;
-    connect(&attempts, &QTimer::timeout, this, [&] {
-        attempts.stop();
-        if (!listen())
-            attempts.start();
-    });
-    attempts.start(5);
-    REQUIRE(device.start({"--set", "radio.ack=late", "--set", "radio.ack_delay=1500"}));
+    REQUIRE(device.begin({"--set", "radio.ack=late", "--set", "radio.ack_delay=1500"}));
+    QVERIFY(listen());
+    REQUIRE(device.waitReady());
     (void)QTest::qWaitFor([&] { return told.contains(startPacket); }, limitMs);
     for (const auto& command : std::as_const(told))
         if (!command.startsWith("dsp."))
