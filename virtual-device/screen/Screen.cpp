@@ -39,8 +39,8 @@ Screen::~Screen()
 
 void Screen::open(const QString& socketPath)
 {
-    // By name, here and below: Qt copies the arguments. What a functor captures crosses between the threads behind locks
-    // that the thread sanitizer does not see.
+    // By name, here and below: Qt copies the arguments. What a functor captures crosses between the threads behind
+    // locks that the thread sanitizer does not see.
     QMetaObject::invokeMethod(connection, "open", Q_ARG(QString, socketPath));
 }
 
