@@ -1,6 +1,8 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
+#include "tests/support/Repetition.h"
+
 #include <QFile>
 #include <QTest>
 #include <QtEndian>
@@ -57,6 +59,11 @@ private slots:
         for (qsizetype offset = 44; offset + 1 < wav.size(); offset += 2)
             loudest = std::max(loudest, std::abs(number<qint16>(wav, offset)));
         QVERIFY(loudest > 8'000);
+    }
+
+    void noPartOfTheTestSoundIsLikeAnother()
+    {
+        QVERIFY(!TestSupport::hasRepeatedBuffer(content(QStringLiteral(":/sounds/TestSound.wav")).mid(44), 8192));
     }
 };
 

@@ -8,15 +8,18 @@
 #include "virtual-device/sandbox/SandboxPlan.h"
 #include "virtual-device/sandbox/StateFolder.h"
 
-#include <QElapsedTimer>
 #include <QFile>
+#include <QSignalSpy>
 #include <QTemporaryDir>
 #include <QTest>
+#include <QTimer>
 
 #include <fcntl.h>
+#include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+using namespace std::chrono_literals;
 using namespace VirtualDevice;
 
 namespace
@@ -39,6 +42,13 @@ public:
         return ::write(descriptor, bytes.constData(), static_cast<std::size_t>(bytes.size())) == bytes.size();
     }
 
+    /// Whether the watcher has taken all of it.
+    [[nodiscard]] bool isRead() const
+    {
+        int left = -1;
+        return ::ioctl(descriptor, FIONREAD, &left) == 0 && left == 0;
+    }
+
 private:
     int descriptor;
 };
@@ -53,6 +63,7 @@ class AudioWatcherTest : public QObject
     std::unique_ptr<Registry> registry;
     std::unique_ptr<AudioWatcher> watcher;
     QByteArray samples;
+    AudioWatcher::Clock::time_point time; ///< the watcher's; stands still unless a test moves it
 
     [[nodiscard]] qint64 number(const char* name) const { return registry->integer(QString::fromLatin1(name)); }
     [[nodiscard]] bool flag(const char* name) const { return registry->flag(QString::fromLatin1(name)); }
@@ -78,7 +89,7 @@ private slots:
     {
         folder = std::make_unique<QTemporaryDir>();
         registry = std::make_unique<Registry>();
-        watcher = std::make_unique<AudioWatcher>(*registry);
+        watcher = std::make_unique<AudioWatcher>(*registry, [this] { return time; });
         writeWav(testSound());
         samples = wavSamples(testSound());
         QCOMPARE(samples.size(), 32'000);
@@ -133,7 +144,7 @@ private slots:
         const QByteArray bytes = played() + silence;
         for (qsizetype at = 0; at < bytes.size(); at += 3000) {
             QVERIFY(program.write(bytes.mid(at, 3000)));
-            QTest::qWait(1);
+            QTRY_VERIFY(program.isRead());
         }
         QTRY_COMPARE(number("audio.buffers"), 5);
         QCOMPARE(number("audio.mismatches"), 0);
@@ -154,16 +165,31 @@ private slots:
         const Writer program(stream());
         QVERIFY(program.write(played().first(bufferSize)));
         QTRY_VERIFY(flag("audio.playing"));
-        QElapsedTimer clock;
-        clock.start();
+        QSignalSpy checks(watcher->findChild<QTimer*>(), &QTimer::timeout);
+        time += 256ms + 500ms; // as late as a scheduler may make it
+        QTRY_VERIFY(checks.count() >= 2);
+        QVERIFY(flag("audio.playing"));
+        QCOMPARE(number("audio.gap_ms"), 0);
+        time += 1ms;
         QTRY_VERIFY(!flag("audio.playing"));
-        QTRY_VERIFY(number("audio.gap_ms") > 1000);
-        QVERIFY(clock.elapsed() >= 1000);
-        const auto before = number("audio.gap_ms");
+        QCOMPARE(number("audio.gap_ms"), 501);
+        time += 1s;
+        QTRY_COMPARE(number("audio.gap_ms"), 1501);
         QVERIFY(program.write(played().mid(bufferSize, bufferSize)));
         QTRY_VERIFY(flag("audio.playing"));
-        QVERIFY(number("audio.gap_ms") >= before);
+        QCOMPARE(number("audio.gap_ms"), 1501);
         QCOMPARE(number("audio.mismatches"), 0);
+    }
+
+    void timeWithoutAStreamAndSilenceAreOneGap()
+    {
+        const Writer program(stream());
+        QVERIFY(program.write(played()));
+        QTRY_COMPARE(number("audio.buffers"), 4);
+        time += 1256ms;
+        QVERIFY(program.write(silence + played()));
+        QTRY_COMPARE(number("audio.sounds"), 2);
+        QCOMPARE(number("audio.gap_ms"), 24 + 1000 + 256);
     }
 
     void gapsAndMismatchesCanBeForgotten()
@@ -185,8 +211,10 @@ private slots:
         QTRY_COMPARE(number("audio.buffers"), 5);
         QByteArray other = testSound();
         other[100] = static_cast<char>(other[100] ^ 1);
-        QTest::qWait(20); // file dates are no finer than the kernel's tick
         writeWav(other);
+        QFile file(wav()); // both may have been written within a tick of the kernel's
+        QVERIFY(file.open(QIODevice::ReadWrite));
+        QVERIFY(file.setFileTime(QDateTime::currentDateTime().addSecs(5), QFile::FileModificationTime));
         samples = wavSamples(other);
         QVERIFY(program.write(played()));
         QTRY_COMPARE(number("audio.sounds"), 2);
@@ -203,9 +231,10 @@ private slots:
             }
             QTRY_VERIFY(!flag("audio.playing"));
             QCOMPARE(number("audio.sounds"), round);
+            time += 1h; // nobody plays, and nobody is missed
+            QVERIFY(!watcher->findChild<QTimer*>()->isActive());
         }
         QCOMPARE(number("audio.mismatches"), 0);
-        QTest::qWait(700); // nobody plays, and nobody is missed
         QCOMPARE(number("audio.gap_ms"), 0);
     }
 

@@ -3,6 +3,9 @@
 
 #include "virtual-device/sandbox/StateFolder.h"
 
+#include "tests/support/Repetition.h"
+#include "virtual-device/audio/SoundMatcher.h"
+
 #include <QDir>
 #include <QFile>
 #include <QTemporaryDir>
@@ -18,6 +21,8 @@ private slots:
     void keepsWhatIsThereAlready();
     void folderThatCannotBeMadeIsReported();
     void testSoundIsSixteenKilohertzMonoSixteenBit();
+    void testSoundCanBeHeard();
+    void noPartOfTheTestSoundIsLikeAnother();
 };
 
 void StateFolderTest::laysOutWhatTheProgramExpects()
@@ -68,7 +73,21 @@ void StateFolderTest::testSoundIsSixteenKilohertzMonoSixteenBit()
     QCOMPARE(sound.mid(36, 4), "data");
     QCOMPARE(word(40), quint32(sound.size() - 44));
     QCOMPARE(word(40), 32'000U);
-    QVERIFY(qFromLittleEndian<qint16>(sound.constData() + 44 + 2 * 4) > 10'000); // a quarter of the tone's period
+}
+
+void StateFolderTest::testSoundCanBeHeard()
+{
+    const QByteArray sound = VirtualDevice::testSound();
+    int loudest = 0;
+    for (qsizetype offset = 44; offset < sound.size(); offset += 2)
+        loudest = std::max(loudest, std::abs(int(qFromLittleEndian<qint16>(sound.constData() + offset))));
+    QVERIFY(loudest > 10'000);
+}
+
+void StateFolderTest::noPartOfTheTestSoundIsLikeAnother()
+{
+    const QByteArray samples = VirtualDevice::testSound().mid(44);
+    QVERIFY(!TestSupport::hasRepeatedBuffer(samples, VirtualDevice::SoundMatcher::bufferSize));
 }
 
 QTEST_GUILESS_MAIN(StateFolderTest)

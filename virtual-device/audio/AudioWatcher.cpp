@@ -45,8 +45,8 @@ QByteArray mixerConfiguration()
 
 } // namespace
 
-AudioWatcher::AudioWatcher(Registry& controls, QObject* parent)
-    : QObject(parent), registry(controls), stallTimer(this), mixerWatcher(this)
+AudioWatcher::AudioWatcher(Registry& controls, std::function<Clock::time_point()> clock, QObject* parent)
+    : QObject(parent), registry(controls), now(std::move(clock)), stallTimer(this), mixerWatcher(this)
 {
     connect(&stallTimer, &QTimer::timeout, this, &AudioWatcher::checkStall);
     connect(&mixerWatcher, &QFileSystemWatcher::directoryChanged, this, &AudioWatcher::readMixer);
@@ -164,14 +164,19 @@ void AudioWatcher::programEnded()
     (void)openPipe();
 }
 
+/// Milliseconds for which the next buffer is due.
+qint64 AudioWatcher::lateness() const
+{
+    return std::chrono::duration_cast<std::chrono::milliseconds>(now() - lastArrival).count() - bufferTime;
+}
+
 void AudioWatcher::heard(QByteArrayView buffer)
 {
-    const auto now = Clock::now();
     if (hasSounded) {
-        const auto late = std::chrono::duration_cast<std::chrono::milliseconds>(now - lastArrival).count() - bufferTime;
+        const auto late = lateness();
         stalled += late > schedulersWhim ? late : 0;
     }
-    lastArrival = now;
+    lastArrival = now();
     if (matcher.isBetweenSounds())
         adoptSound();
     registry.count(QStringLiteral("audio.buffers"));
@@ -224,8 +229,7 @@ void AudioWatcher::extendGap(qint64 milliseconds)
 /// Makes a gap visible while it lasts: nobody knows whether the stream will ever go on.
 void AudioWatcher::checkStall()
 {
-    const auto silent = std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - lastArrival).count();
-    const qint64 late = silent - bufferTime;
+    const qint64 late = lateness();
     if (late <= schedulersWhim)
         return;
     registry.publish(QStringLiteral("audio.playing"), false);

@@ -12,6 +12,7 @@
 #include <QTimer>
 
 #include <chrono>
+#include <functional>
 #include <memory>
 #include <optional>
 
@@ -42,7 +43,11 @@ public:
     static constexpr auto visibleFolder = "/run/sound";
     static constexpr auto visiblePlugin = "/run/sound-card/mixer.so";
 
-    explicit AudioWatcher(Registry& registry, QObject* parent = nullptr);
+    using Clock = std::chrono::steady_clock;
+
+    /// `now` is the time by which a stream is late.
+    explicit AudioWatcher(Registry& registry, std::function<Clock::time_point()> now = Clock::now,
+                          QObject* parent = nullptr);
     ~AudioWatcher() override;
 
     /// Lays out `folder` and listens. `soundFile` is what should be heard; it is read anew when it has changed. Returns
@@ -55,13 +60,12 @@ public:
     void contribute(SandboxPlan& plan, const QString& pluginFile) const;
 
 private:
-    using Clock = std::chrono::steady_clock;
-
     [[nodiscard]] std::optional<QString> layOut();
     [[nodiscard]] bool openPipe();
     void closePipe();
     void readAvailable();
     void programEnded();
+    [[nodiscard]] qint64 lateness() const;
     void heard(QByteArrayView buffer);
     void adoptSound();
     void judge(const SoundMatcher::Judgement& judgement);
@@ -72,6 +76,7 @@ private:
     void forget();
 
     Registry& registry;
+    std::function<Clock::time_point()> now;
     QString folder;
     QString soundFile;
     QDateTime soundDate;

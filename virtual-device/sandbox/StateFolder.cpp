@@ -19,8 +19,16 @@ namespace
 constexpr quint32 sampleRate = 16'000;
 constexpr quint32 sampleCount = sampleRate;
 constexpr quint32 sampleBytes = 2;
-constexpr double toneFrequency = 1000;
+constexpr double firstFrequency = 500;
+constexpr double lastFrequency = 1500;
 constexpr double amplitude = 0.5 * 32767;
+
+/// At a time in seconds, of the one second that the sound takes.
+qint16 sampleAt(double time)
+{
+    const double periods = firstFrequency * time + (lastFrequency - firstFrequency) * time * time / 2;
+    return static_cast<qint16>(std::lround(amplitude * std::sin(2 * std::numbers::pi * periods)));
+}
 
 std::optional<QString> writeUnlessThere(const QString& path, const QByteArray& content)
 {
@@ -60,8 +68,7 @@ QByteArray testSound()
     out.writeRawData("data", 4);
     out << dataBytes;
     for (quint32 index = 0; index < sampleCount; ++index)
-        out << static_cast<qint16>(
-            std::lround(amplitude * std::sin(2 * std::numbers::pi * toneFrequency * index / sampleRate)));
+        out << sampleAt(static_cast<double>(index) / sampleRate);
     return bytes;
 }
 

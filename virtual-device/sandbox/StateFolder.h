@@ -15,7 +15,8 @@ namespace VirtualDevice
 /// the DSP's firmware image dsp.out. What is there already stays as it is. Returns what went wrong.
 [[nodiscard]] std::optional<QString> prepareState(const QString& folder);
 
-/// The test sound: a WAV file of one second of a 1 kHz tone, 16 kHz, signed 16 bit little-endian, mono.
+/// The test sound: a WAV file of one second of a tone that rises from 500 to 1500 Hz, 16 kHz, signed 16 bit
+/// little-endian, mono. No part of it is like another, so that a buffer that is lost, repeated or swapped is seen.
 [[nodiscard]] QByteArray testSound();
 
 } // namespace VirtualDevice
