@@ -3,20 +3,17 @@
 
 #include "Domain/src/DomainLayer/Dsp.h"
 #include "Domain/src/DomainLayer/DspPort.h"
+#include "benchmarks/Domain/RoundTrip.h"
 #include "tests/support/AssertionLine.h"
 
-#include <QCoreApplication>
 #include <QFile>
 #include <QMutex>
 #include <QWaitCondition>
 
 #include <benchmark/benchmark.h>
-#include <sched.h>
 
 #include <algorithm>
-#include <chrono>
 #include <thread>
-#include <vector>
 
 #ifdef BENCHMARK_OVER_SOCKET
 #include "tests/support/DspPeer.h"
@@ -30,39 +27,7 @@
 namespace
 {
 
-using Clock = std::chrono::steady_clock;
-using Microseconds = std::chrono::duration<double, std::micro>;
-
-constexpr int rounds = 5000;
-
-void pinToOneProcessor()
-{
-    cpu_set_t one;
-    CPU_ZERO(&one);
-    CPU_SET(static_cast<std::size_t>(::sched_getcpu()), &one);
-    ::sched_setaffinity(0, sizeof one, &one);
-}
-
-struct Percentiles
-{
-    double median;
-    double high;
-};
-
-template <typename Exchange> Percentiles measured(Exchange exchange)
-{
-    constexpr int warmUp = 200;
-    for (int round = 0; round < warmUp; ++round)
-        exchange();
-    std::vector<double> times;
-    for (int round = 0; round < rounds; ++round) {
-        const auto start = Clock::now();
-        exchange();
-        times.push_back(Microseconds(Clock::now() - start).count());
-    }
-    std::sort(times.begin(), times.end());
-    return {times.at(times.size() / 2), times.at(times.size() * 99 / 100)};
-}
+using Benchmarks::measured;
 
 /// Hands a turn to a second thread and waits to get it back.
 class BareHandOver
@@ -165,10 +130,10 @@ void timeOut(benchmark::State& state)
     double longest = 0;
     double shortest = 1e9;
     for ([[maybe_unused]] auto iteration : state) {
-        const auto start = Clock::now();
+        const auto start = Benchmarks::Clock::now();
         if (dsp.requestVersion())
             std::abort();
-        const double milliseconds = Microseconds(Clock::now() - start).count() / 1000;
+        const double milliseconds = Benchmarks::Microseconds(Benchmarks::Clock::now() - start).count() / 1000;
         longest = std::max(longest, milliseconds);
         shortest = std::min(shortest, milliseconds);
     }
@@ -183,9 +148,5 @@ BENCHMARK(timeOut)->Name("command without an answer")->Iterations(10)->UseRealTi
 
 int main(int argc, char** argv)
 {
-    pinToOneProcessor();
-    const QCoreApplication application(argc, argv);
-    benchmark::Initialize(&argc, argv);
-    benchmark::RunSpecifiedBenchmarks();
-    return 0;
+    return Benchmarks::runOnOneProcessor(argc, argv);
 }

@@ -3,23 +3,20 @@
 
 #include "Domain/src/DomainLayer/BeaconProcessor.h"
 #include "Domain/src/DomainLayer/SerialPort.h"
+#include "benchmarks/Domain/RoundTrip.h"
 #include "tests/Domain/Frames.h"
 #include "tests/Domain/Pty.h"
 
-#include <QCoreApplication>
 #include <QEventLoop>
 
 #include <benchmark/benchmark.h>
 #include <fcntl.h>
 #include <poll.h>
-#include <sched.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <atomic>
-#include <chrono>
 #include <thread>
-#include <vector>
 
 /// Round trip of a ping over a pty, from `sendPing()` to `pingResponse()` on the caller's thread, beside a raw
 /// write/poll/read loop against the same peer; everything on one processor. Times in microseconds; "of_raw" is the
@@ -27,21 +24,13 @@
 namespace
 {
 
-using Clock = std::chrono::steady_clock;
-using Microseconds = std::chrono::duration<double, std::micro>;
+using Benchmarks::measured;
+using Benchmarks::Percentiles;
 using TestSupport::frameOf;
 using TestSupport::Pty;
 
 const QByteArray ping = frameOf("\x7E");
 const QByteArray answer = frameOf("\xFE") + frameOf("\x7F");
-
-void pinToOneProcessor()
-{
-    cpu_set_t one;
-    CPU_ZERO(&one);
-    CPU_SET(static_cast<std::size_t>(::sched_getcpu()), &one);
-    ::sched_setaffinity(0, sizeof one, &one);
-}
 
 /// Answers a whole ping at once.
 class Peer
@@ -76,34 +65,6 @@ private:
     std::atomic<bool> stopping = false;
     std::thread thread;
 };
-
-struct Percentiles
-{
-    double median;
-    double high;
-};
-
-Percentiles percentilesOf(std::vector<double> times)
-{
-    std::sort(times.begin(), times.end());
-    return {times.at(times.size() / 2), times.at(times.size() * 99 / 100)};
-}
-
-constexpr int rounds = 5000;
-
-template <typename Exchange> Percentiles measured(Exchange exchange)
-{
-    constexpr int warmUp = 200;
-    for (int round = 0; round < warmUp; ++round)
-        exchange();
-    std::vector<double> times;
-    for (int round = 0; round < rounds; ++round) {
-        const auto start = Clock::now();
-        exchange();
-        times.push_back(Microseconds(Clock::now() - start).count());
-    }
-    return percentilesOf(std::move(times));
-}
 
 Percentiles rawExchange()
 {
@@ -160,9 +121,5 @@ BENCHMARK(pingRoundTrip)->Name("ping round trip, one processor")->Iterations(1)-
 
 int main(int argc, char** argv)
 {
-    pinToOneProcessor();
-    const QCoreApplication application(argc, argv);
-    benchmark::Initialize(&argc, argv);
-    benchmark::RunSpecifiedBenchmarks();
-    return 0;
+    return Benchmarks::runOnOneProcessor(argc, argv);
 }

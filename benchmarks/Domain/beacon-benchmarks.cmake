@@ -8,7 +8,8 @@ add_executable(FrameBenchmark Domain/FrameBenchmark.cpp Domain/StubbedLog.cpp ${
 target_compile_definitions(FrameBenchmark PRIVATE BENCHMARK_STREAM_SIZE=8388608)
 add_executable(FrameAndLogBenchmark Domain/FrameBenchmark.cpp ${streams})
 target_compile_definitions(FrameAndLogBenchmark PRIVATE BENCHMARK_STREAM_SIZE=8192)
-add_executable(PingBenchmark Domain/PingBenchmark.cpp ../tests/Domain/Frames.cpp ../tests/Domain/Pty.cpp)
+add_executable(PingBenchmark Domain/PingBenchmark.cpp Domain/RoundTrip.cpp Domain/RoundTrip.h
+  ../tests/Domain/Frames.cpp ../tests/Domain/Pty.cpp)
 add_executable(RadioLinkSoak Domain/RadioLinkSoak.cpp ../tests/Domain/Frames.cpp ../tests/Domain/Pty.cpp)
 foreach(program FrameBenchmark FrameAndLogBenchmark PingBenchmark RadioLinkSoak)
   target_link_libraries(${program} PRIVATE ProjectOptions Domain Qt6::Core Qt6::Test benchmark::benchmark)

@@ -7,8 +7,9 @@ if(NOT DSPLINK_ROOT)
   # Linked in front of the library, the DSP in the process takes the place of the whole interface.
   add_executable(SensorDataBenchmark Domain/SensorDataBenchmark.cpp Domain/AllocationCount.cpp Domain/AllocationCount.h
     ${instant_dsp})
-  add_executable(DspCommandBenchmark Domain/DspCommandBenchmark.cpp ${instant_dsp})
-  add_executable(DspCommandOverSocketBenchmark Domain/DspCommandBenchmark.cpp)
+  set(dsp_command Domain/DspCommandBenchmark.cpp Domain/RoundTrip.cpp Domain/RoundTrip.h)
+  add_executable(DspCommandBenchmark ${dsp_command} ${instant_dsp})
+  add_executable(DspCommandOverSocketBenchmark ${dsp_command})
   target_compile_definitions(DspCommandOverSocketBenchmark PRIVATE BENCHMARK_OVER_SOCKET)
   add_executable(DspSoak Domain/DspSoak.cpp)
   foreach(program SensorDataBenchmark DspCommandBenchmark DspCommandOverSocketBenchmark DspSoak)

@@ -4,6 +4,7 @@
 #include "presentation/FuelGuageTest.h"
 
 #include "tests/presentation/DebugOutput.h"
+#include "tests/presentation/Poll.h"
 #include "tests/presentation/WidgetProbe.h"
 
 #include <QDoubleSpinBox>
@@ -15,6 +16,7 @@
 
 using Presentation::FuelGuageTest;
 using TestSupport::child;
+using TestSupport::Poll;
 using TestSupport::writeFile;
 
 namespace
@@ -147,17 +149,14 @@ private slots:
 
     void everySecondTheFilesAreReadAgain()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkGauge");
         FuelGuageTest test(nullptr);
         test.start();
         writeFile(voltageFile, "3600000\n");
         writeFile(currentFile, "250000\n");
         QTRY_COMPARE_WITH_TIMEOUT(voltageText(test), QStringLiteral("Voltage = 3.600000 V"), 20'000);
         QCOMPARE(currentText(test), QStringLiteral("Current = 250.0000 mA"));
-        const auto* const timer = probe.waitForTimer();
-        QCOMPARE(timer->interval(), 1000);
-        QVERIFY(timer->isSingleShot());
-        QVERIFY(timer->isActive());
+        poll.compareTimer();
     }
 
     void aFileThatDoesNotOpenIsToldAndLeavesItsNumber()
@@ -211,38 +210,19 @@ private slots:
 
     void stopsAndStartsAgain()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkGauge");
         FuelGuageTest test(nullptr);
-        test.start();
-        const auto* const timer = probe.waitForTimer();
-        QVERIFY(timer != nullptr);
-        QTRY_VERIFY_WITH_TIMEOUT(timer->isActive(), 20'000);
-        test.stop();
-        QVERIFY(!timer->isActive());
-        writeFile(voltageFile, "3600000\n");
-        QVERIFY(QMetaObject::invokeMethod(&test, "checkGauge"));
-        QCOMPARE(voltageText(test), QStringLiteral("Voltage = 4.100000 V"));
-        test.start();
+        poll.compareStopAndStart(
+            test, [] { writeFile(voltageFile, "3600000\n"); }, [&] { return voltageText(test); });
         QCOMPARE(voltageText(test), QStringLiteral("Voltage = 3.600000 V"));
-        QVERIFY(timer->isActive());
     }
 
     void aNumberThatStaysIsNotPaintedAgain()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkGauge");
         FuelGuageTest test(nullptr);
         test.setAttribute(Qt::WA_ShowWithoutActivating);
-        test.show();
-        QVERIFY(QTest::qWaitForWindowExposed(&test));
-        test.start();
-        QTest::qWait(100);
-        const TestSupport::PaintCounter counter(test);
-        const auto* const timer = probe.waitForTimer();
-        QVERIFY(timer != nullptr);
-        QTRY_VERIFY_WITH_TIMEOUT(probe.firings(timer) >= 2, 20'000);
-        QCOMPARE(counter.paints, 0);
-        writeFile(voltageFile, "3600000\n");
-        QTRY_VERIFY_WITH_TIMEOUT(counter.paints > 0, 20'000);
+        poll.comparePaints(test, [] { writeFile(voltageFile, "3600000\n"); });
     }
 };
 

@@ -23,6 +23,7 @@ namespace
 const QString started = QStringLiteral("Starting ImmunityRig");
 const QString probeFile = QStringLiteral("/mnt/data/testfile");
 const QString screenReport = QStringLiteral("/mnt/screen-probe");
+constexpr const char* gauge = "/sys/class/power_supply/ds2780-battery.0/voltage_now";
 constexpr int patienceMs = 60'000;
 
 /// The program as it ships, on a device whose files the case has laid out.
@@ -62,6 +63,13 @@ public:
             ::kill(static_cast<pid_t>(processId()), number);
     }
 
+    /// Waits for it to end by itself, and without complaint.
+    [[nodiscard]] bool endsOrderly()
+    {
+        return QTest::qWaitFor([this] { return state() == NotRunning; }, patienceMs) && exitStatus() == NormalExit &&
+               exitCode() == 0;
+    }
+
     /// Whether it is set to handle the signal itself. Asked once it has logged something: before, it is still a fork of
     /// the test, with the test's handlers.
     [[nodiscard]] bool catches(int number) const
@@ -83,6 +91,21 @@ bool pollsAgain()
 {
     QFile::remove(probeFile);
     return QTest::qWaitFor([] { return QFile::exists(probeFile); }, patienceMs);
+}
+
+bool hasScreenReport()
+{
+    return QTest::qWaitFor([] { return QFile::exists(screenReport); }, patienceMs);
+}
+
+/// A gauge that never answers holds the program's start until somebody writes to it.
+void startHeldByItsGauge(Program& program, const LogCapture& log)
+{
+    QDir().mkpath(QFileInfo(QString::fromLatin1(gauge)).path());
+    QCOMPARE(::mkfifo(gauge, 0644), 0);
+    program.start();
+    QVERIFY(log.waitFor(started));
+    QTRY_VERIFY_WITH_TIMEOUT(program.catches(SIGTERM), patienceMs);
 }
 
 } // namespace
@@ -126,7 +149,7 @@ private slots:
     {
         Program program;
         program.startWithScreenProbe();
-        QTRY_VERIFY_WITH_TIMEOUT(QFile::exists(screenReport), patienceMs);
+        QVERIFY(hasScreenReport());
         QVERIFY(TestSupport::readFile(screenReport).contains("closed=1\n"));
         for (int second = 0; second < 2; ++second)
             QVERIFY(pollsAgain());
@@ -137,7 +160,7 @@ private slots:
     {
         Program program;
         program.startWithScreenProbe();
-        QTRY_VERIFY_WITH_TIMEOUT(QFile::exists(screenReport), patienceMs);
+        QVERIFY(hasScreenReport());
         QVERIFY(TestSupport::readFile(screenReport).startsWith("QT_QPA_FB_FORCE_FULLSCREEN=0\n"));
     }
 
@@ -147,16 +170,14 @@ private slots:
         const LogCapture log;
         Program program;
         program.startWithScreenProbe();
-        QTRY_VERIFY_WITH_TIMEOUT(QFile::exists(screenReport), patienceMs);
+        QVERIFY(hasScreenReport());
         program.signal(SIGTERM);
         QVERIFY(log.waitFor(QStringLiteral("window destroyed")));
         const auto lines = log.lines();
         const auto last =
             std::find_if(lines.begin(), lines.end(), [](const auto& line) { return line.text == u"window destroyed"; });
         QCOMPARE(last->identity, QStringLiteral("immunityrig"));
-        QTRY_COMPARE_WITH_TIMEOUT(program.state(), QProcess::NotRunning, patienceMs);
-        QCOMPARE(program.exitStatus(), QProcess::NormalExit);
-        QCOMPARE(program.exitCode(), 0);
+        QVERIFY(program.endsOrderly());
     }
 
     void endsOrderlyOnATerminationSignal_data()
@@ -173,22 +194,15 @@ private slots:
         program.start();
         QVERIFY(pollsAgain());
         program.signal(number);
-        QVERIFY(program.waitForFinished(patienceMs));
-        QCOMPARE(program.exitStatus(), QProcess::NormalExit);
-        QCOMPARE(program.exitCode(), 0);
+        QVERIFY(program.endsOrderly());
     }
 
-    /// A gauge that never answers holds the event loop, which the first signal would end.
+    /// The gauge holds the event loop, which the first signal would end.
     void aSecondSignalKillsAProgramThatHangs()
     {
-        const QByteArray gauge("/sys/class/power_supply/ds2780-battery.0/voltage_now");
-        QDir().mkpath(QFileInfo(QString::fromLatin1(gauge)).path());
-        QCOMPARE(::mkfifo(gauge.constData(), 0644), 0);
         const LogCapture log;
         Program program;
-        program.start();
-        QVERIFY(log.waitFor(started));
-        QTRY_VERIFY_WITH_TIMEOUT(program.catches(SIGTERM), patienceMs);
+        startHeldByItsGauge(program, log);
         program.signal(SIGTERM);
         QTRY_VERIFY_WITH_TIMEOUT(!program.catches(SIGTERM), patienceMs);
         QVERIFY(!program.catches(SIGINT));
@@ -201,21 +215,14 @@ private slots:
 
     void aSignalDuringStartUpEndsItAsSoonAsTheWindowStands()
     {
-        const QByteArray gauge("/sys/class/power_supply/ds2780-battery.0/voltage_now");
-        QDir().mkpath(QFileInfo(QString::fromLatin1(gauge)).path());
-        QCOMPARE(::mkfifo(gauge.constData(), 0644), 0);
         const LogCapture log;
         Program program;
-        program.start();
-        QVERIFY(log.waitFor(started));
-        QTRY_VERIFY_WITH_TIMEOUT(program.catches(SIGTERM), patienceMs);
+        startHeldByItsGauge(program, log);
         program.signal(SIGTERM);
         QTRY_VERIFY_WITH_TIMEOUT(!program.catches(SIGTERM), patienceMs);
-        const int writer = ::open(gauge.constData(), O_WRONLY | O_CLOEXEC);
+        const int writer = ::open(gauge, O_WRONLY | O_CLOEXEC);
         ::close(writer);
-        QVERIFY(program.waitForFinished(patienceMs));
-        QCOMPARE(program.exitStatus(), QProcess::NormalExit);
-        QCOMPARE(program.exitCode(), 0);
+        QVERIFY(program.endsOrderly());
     }
 
     /// Without a clock it has something to say every second.

@@ -4,6 +4,7 @@
 #include "presentation/RtcTest.h"
 
 #include "tests/presentation/DebugOutput.h"
+#include "tests/presentation/Poll.h"
 #include "tests/presentation/WidgetProbe.h"
 
 #include <QDateTimeEdit>
@@ -11,6 +12,7 @@
 
 using Presentation::RtcTest;
 using TestSupport::child;
+using TestSupport::Poll;
 
 namespace
 {
@@ -138,17 +140,9 @@ private slots:
 
     void aFieldThatShowsTheSameIsNotPaintedAgain()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("updateTime");
         RtcTest test(nullptr);
-        test.show();
-        QVERIFY(QTest::qWaitForWindowExposed(&test));
-        test.start();
-        QCoreApplication::processEvents();
-        const TestSupport::PaintCounter counter(test);
-        const auto* const timer = probe.waitForTimer();
-        QVERIFY(timer != nullptr);
-        QTRY_VERIFY_WITH_TIMEOUT(probe.firings(timer) >= 2, 20'000);
-        QCOMPARE(counter.paints, 0);
+        poll.comparePaints(test);
     }
 };
 

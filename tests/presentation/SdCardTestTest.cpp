@@ -5,6 +5,7 @@
 
 #include "tests/presentation/DebugOutput.h"
 #include "tests/presentation/LabelForm.h"
+#include "tests/presentation/Poll.h"
 #include "tests/presentation/WidgetProbe.h"
 
 #include <QLabel>
@@ -18,6 +19,7 @@
 using Presentation::SdCardTest;
 using TestSupport::child;
 using TestSupport::green;
+using TestSupport::Poll;
 using TestSupport::readFile;
 using TestSupport::red;
 using TestSupport::writeFile;
@@ -216,7 +218,7 @@ private slots:
 
     void followsTheCardInBothDirections()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkConnected");
         SdCardTest test(nullptr);
         test.start();
         QCOMPARE(style(test), green);
@@ -225,10 +227,7 @@ private slots:
         QCOMPARE(readFile(probeFile), probeText);
         QDir().mkpath(card);
         QTRY_COMPARE_WITH_TIMEOUT(style(test), green, 20'000);
-        const auto* const timer = probe.waitForTimer();
-        QCOMPARE(timer->interval(), 1000);
-        QVERIFY(timer->isSingleShot());
-        QVERIFY(timer->isActive());
+        poll.compareTimer();
     }
 
     void aProbeFileThatVanishesIsWrittenAgain()
@@ -242,20 +241,11 @@ private slots:
 
     void stopsAndStartsAgain()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkConnected");
         SdCardTest test(nullptr);
-        test.start();
-        const auto* const timer = probe.waitForTimer();
-        QVERIFY(timer != nullptr);
-        QTRY_VERIFY_WITH_TIMEOUT(timer->isActive(), 20'000);
-        test.stop();
-        QVERIFY(!timer->isActive());
-        TestSupport::removePath(card);
-        QVERIFY(QMetaObject::invokeMethod(&test, "checkConnected"));
-        QCOMPARE(style(test), green);
-        test.start();
+        poll.compareStopAndStart(
+            test, [] { TestSupport::removePath(card); }, [&] { return style(test); });
         QCOMPARE(style(test), red);
-        QVERIFY(timer->isActive());
     }
 };
 

@@ -5,6 +5,7 @@
 
 #include "tests/presentation/DebugOutput.h"
 #include "tests/presentation/LabelForm.h"
+#include "tests/presentation/Poll.h"
 #include "tests/presentation/WidgetProbe.h"
 
 #include <QLabel>
@@ -15,6 +16,7 @@
 using Presentation::UsbDeviceTest;
 using TestSupport::child;
 using TestSupport::green;
+using TestSupport::Poll;
 using TestSupport::red;
 
 namespace
@@ -76,7 +78,7 @@ private slots:
     void followsTheDeviceInBothDirections()
     {
         const TestSupport::DebugOutput output;
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkConnect");
         UsbDeviceTest test(nullptr);
         auto& label = child<QLabel>(test, "connectLabel");
         test.start();
@@ -87,10 +89,7 @@ private slots:
         QTRY_COMPARE_WITH_TIMEOUT(label.styleSheet(), red, 20'000);
         plugIn();
         QTRY_COMPARE_WITH_TIMEOUT(label.styleSheet(), green, 20'000);
-        const auto* const timer = probe.waitForTimer();
-        QCOMPARE(timer->interval(), 1000);
-        QVERIFY(timer->isSingleShot());
-        QVERIFY(timer->isActive());
+        poll.compareTimer();
         QCOMPARE(output.texts(), QStringList());
         QCOMPARE(output.complaints(), QStringList());
     }
@@ -125,37 +124,18 @@ private slots:
 
     void stopsAndStartsAgain()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkConnect");
         UsbDeviceTest test(nullptr);
-        test.start();
-        const auto* const timer = probe.waitForTimer();
-        QVERIFY(timer != nullptr);
-        QTRY_VERIFY_WITH_TIMEOUT(timer->isActive(), 20'000);
-        test.stop();
-        QVERIFY(!timer->isActive());
-        plugIn();
-        QVERIFY(QMetaObject::invokeMethod(&test, "checkConnect"));
-        QCOMPARE(child<QLabel>(test, "connectLabel").styleSheet(), red);
-        test.start();
-        QCOMPARE(child<QLabel>(test, "connectLabel").styleSheet(), green);
-        QVERIFY(timer->isActive());
+        const auto& label = child<QLabel>(test, "connectLabel");
+        poll.compareStopAndStart(test, plugIn, [&] { return label.styleSheet(); });
+        QCOMPARE(label.styleSheet(), green);
     }
 
     void aColourThatStaysIsNotPaintedAgain()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkConnect");
         UsbDeviceTest test(nullptr);
-        test.show();
-        QVERIFY(QTest::qWaitForWindowExposed(&test));
-        test.start();
-        QTest::qWait(100);
-        const TestSupport::PaintCounter counter(test);
-        const auto* const timer = probe.waitForTimer();
-        QVERIFY(timer != nullptr);
-        QTRY_VERIFY_WITH_TIMEOUT(probe.firings(timer) >= 2, 20'000);
-        QCOMPARE(counter.paints, 0);
-        plugIn();
-        QTRY_VERIFY_WITH_TIMEOUT(counter.paints > 0, 20'000);
+        poll.comparePaints(test, plugIn);
     }
 };
 

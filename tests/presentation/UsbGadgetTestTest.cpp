@@ -5,6 +5,7 @@
 
 #include "tests/presentation/DebugOutput.h"
 #include "tests/presentation/LabelForm.h"
+#include "tests/presentation/Poll.h"
 #include "tests/presentation/WidgetProbe.h"
 
 #include <QLabel>
@@ -13,6 +14,7 @@
 using Presentation::UsbGadgetTest;
 using TestSupport::child;
 using TestSupport::green;
+using TestSupport::Poll;
 using TestSupport::red;
 using TestSupport::writeFile;
 
@@ -81,7 +83,7 @@ private slots:
 
     void theOpenFileIsReadAnewEverySecond()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkConnect");
         UsbGadgetTest test(nullptr);
         auto& label = child<QLabel>(test, "connectLabel");
         test.start();
@@ -93,10 +95,7 @@ private slots:
             writeFile(mode, "b_peripheral\n");
             QTRY_COMPARE_WITH_TIMEOUT(label.styleSheet(), green, 20'000);
         }
-        const auto* const timer = probe.waitForTimer();
-        QCOMPARE(timer->interval(), 1000);
-        QVERIFY(timer->isSingleShot());
-        QVERIFY(timer->isActive());
+        poll.compareTimer();
     }
 
     void aFileThatWasEmptyIsReadOnceItHoldsSomething()
@@ -140,20 +139,12 @@ private slots:
 
     void stopsAndStartsAgain()
     {
-        const TestSupport::TimerProbe probe;
+        const Poll poll("checkConnect");
         UsbGadgetTest test(nullptr);
-        test.start();
-        const auto* const timer = probe.waitForTimer();
-        QVERIFY(timer != nullptr);
-        QTRY_VERIFY_WITH_TIMEOUT(timer->isActive(), 20'000);
-        test.stop();
-        QVERIFY(!timer->isActive());
-        writeFile(mode, "a_host\n");
-        QVERIFY(QMetaObject::invokeMethod(&test, "checkConnect"));
-        QCOMPARE(child<QLabel>(test, "connectLabel").styleSheet(), green);
-        test.start();
-        QCOMPARE(child<QLabel>(test, "connectLabel").styleSheet(), red);
-        QVERIFY(timer->isActive());
+        const auto& label = child<QLabel>(test, "connectLabel");
+        poll.compareStopAndStart(
+            test, [] { writeFile(mode, "a_host\n"); }, [&] { return label.styleSheet(); });
+        QCOMPARE(label.styleSheet(), red);
     }
 };
 

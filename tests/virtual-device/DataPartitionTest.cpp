@@ -4,8 +4,7 @@
 #include "virtual-device/tree/DataPartition.h"
 
 #include "tests/virtual-device/FuseTest.h"
-#include "virtual-device/registry/Registry.h"
-#include "virtual-device/tree/Mounts.h"
+#include "tests/virtual-device/MountFixture.h"
 
 #include <QDir>
 #include <QFile>
@@ -17,11 +16,11 @@
 
 #include <memory>
 
+using TestSupport::MountFixture;
 using TestSupport::RawFile;
 using VirtualDevice::DataPartition;
-using VirtualDevice::Registry;
 
-class DataPartitionTest : public QObject
+class DataPartitionTest : public MountFixture
 {
     Q_OBJECT
 
@@ -45,9 +44,7 @@ private slots:
     void folderThatDoesNotExistIsReported();
 
 private:
-    [[nodiscard]] QString at(const QString& path) const { return mountPoint->filePath(path); }
     [[nodiscard]] QString behind(const QString& path) const { return folder->filePath(path); }
-    void set(const QString& control, const QJsonValue& value) { QCOMPARE(registry->set(control, value), std::nullopt); }
     static void write(const QString& path, const QByteArray& content)
     {
         QFile file(path);
@@ -61,8 +58,6 @@ private:
     }
 
     std::unique_ptr<QTemporaryDir> folder;
-    std::unique_ptr<QTemporaryDir> mountPoint;
-    std::unique_ptr<Registry> registry;
     std::unique_ptr<DataPartition> partition;
 };
 
@@ -70,8 +65,7 @@ void DataPartitionTest::init()
 {
     REQUIRE_FUSE();
     folder = std::make_unique<QTemporaryDir>();
-    mountPoint = std::make_unique<QTemporaryDir>();
-    registry = std::make_unique<Registry>();
+    makeMountPoint();
     partition = std::make_unique<DataPartition>(*registry);
     QCOMPARE(partition->mount(folder->path(), mountPoint->path()), std::nullopt);
 }
@@ -79,9 +73,7 @@ void DataPartitionTest::init()
 void DataPartitionTest::cleanup()
 {
     partition.reset();
-    if (mountPoint)
-        QVERIFY(VirtualDevice::mountedBelow(mountPoint->path()).isEmpty());
-    mountPoint.reset();
+    removeMountPoint();
     folder.reset();
 }
 
@@ -221,12 +213,7 @@ void DataPartitionTest::fullRefusesGrowthAndStillReadsAndRemoves()
 
 void DataPartitionTest::failureFailsEverything_data()
 {
-    QTest::addColumn<QString>("fault");
-    QTest::addColumn<int>("error");
-    QTest::addRow("EIO") << "EIO" << EIO;
-    QTest::addRow("ENODATA") << "ENODATA" << ENODATA;
-    QTest::addRow("ENOENT") << "ENOENT" << ENOENT;
-    QTest::addRow("EACCES") << "EACCES" << EACCES;
+    TestSupport::addErrnoRows();
 }
 
 void DataPartitionTest::failureFailsEverything()

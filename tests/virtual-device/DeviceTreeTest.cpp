@@ -4,12 +4,10 @@
 #include "virtual-device/tree/DeviceTree.h"
 
 #include "tests/virtual-device/FuseTest.h"
-#include "virtual-device/registry/Registry.h"
-#include "virtual-device/tree/Mounts.h"
+#include "tests/virtual-device/MountFixture.h"
 
 #include <QDir>
 #include <QFile>
-#include <QTemporaryDir>
 #include <QTest>
 
 #include <linux/rtc.h>
@@ -23,9 +21,9 @@
 #include <utility>
 #include <vector>
 
+using TestSupport::MountFixture;
 using TestSupport::RawFile;
 using VirtualDevice::DeviceTree;
-using VirtualDevice::Registry;
 
 namespace
 {
@@ -51,7 +49,7 @@ QByteArray contentOf(const QString& path)
 
 } // namespace
 
-class DeviceTreeTest : public QObject
+class DeviceTreeTest : public MountFixture
 {
     Q_OBJECT
 
@@ -97,31 +95,23 @@ private slots:
     void mountPointThatDoesNotExistIsReported();
 
 private:
-    [[nodiscard]] QString at(const QString& path) const { return folder->filePath(path); }
-    void set(const QString& control, const QJsonValue& value) { QCOMPARE(registry->set(control, value), std::nullopt); }
     [[nodiscard]] int readClock(rtc_time& time) const;
 
-    std::unique_ptr<QTemporaryDir> folder;
-    std::unique_ptr<Registry> registry;
     std::unique_ptr<DeviceTree> tree;
 };
 
 void DeviceTreeTest::init()
 {
     REQUIRE_FUSE();
-    folder = std::make_unique<QTemporaryDir>();
-    registry = std::make_unique<Registry>();
+    makeMountPoint();
     tree = std::make_unique<DeviceTree>(*registry);
-    QCOMPARE(tree->mount(folder->path()), std::nullopt);
+    QCOMPARE(tree->mount(mountPoint->path()), std::nullopt);
 }
 
 void DeviceTreeTest::cleanup()
 {
     tree.reset();
-    if (folder)
-        QVERIFY(VirtualDevice::mountedBelow(folder->path()).isEmpty());
-    registry.reset();
-    folder.reset();
+    removeMountPoint();
 }
 
 void DeviceTreeTest::gaugeHoldsTheValueAndALineEnd_data()
@@ -264,12 +254,7 @@ void DeviceTreeTest::fileFailsWithTheChosenErrno()
 
 void DeviceTreeTest::linkFailsWithTheChosenErrno_data()
 {
-    QTest::addColumn<QString>("fault");
-    QTest::addColumn<int>("error");
-    QTest::addRow("EIO") << "EIO" << EIO;
-    QTest::addRow("ENODATA") << "ENODATA" << ENODATA;
-    QTest::addRow("ENOENT") << "ENOENT" << ENOENT;
-    QTest::addRow("EACCES") << "EACCES" << EACCES;
+    TestSupport::addErrnoRows();
 }
 
 void DeviceTreeTest::linkFailsWithTheChosenErrno()
@@ -558,8 +543,8 @@ void DeviceTreeTest::unmountLeavesNothingAndFailsOpenFiles()
     RawFile file(at(voltage), O_RDONLY);
     QCOMPARE(file.read(100), "4100000\n");
     tree->unmount();
-    QVERIFY(VirtualDevice::mountedBelow(folder->path()).isEmpty());
-    QVERIFY(QDir(folder->path()).isEmpty());
+    QVERIFY(VirtualDevice::mountedBelow(mountPoint->path()).isEmpty());
+    QVERIFY(QDir(mountPoint->path()).isEmpty());
     file.rewind();
     file.read(100);
     QVERIFY(file.error() != 0);
