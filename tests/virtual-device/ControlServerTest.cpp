@@ -106,8 +106,10 @@ private slots:
     void manyClientsAreServedAtOnce();
     void clientThatVanishesInTheMiddleOfAWaitLeavesNothing();
     void subscriberThatNeverReadsIsDropped();
+    void clientThatIsDroppedChangesNothingMore();
     void otherRequestsAreAnsweredDuringAWait();
     void logReturnsTheLinesAfterAMark();
+    void logRefusesAMarkThatIsNone();
     void keysAndPicturesNeedAProgram();
     void clientReportsALostConnection();
 
@@ -394,6 +396,20 @@ void ControlServerTest::subscriberThatNeverReadsIsDropped()
     QVERIFY(client->call("list").isOk());
 }
 
+void ControlServerTest::clientThatIsDroppedChangesNothingMore()
+{
+    const auto before = bench->registry.value(control);
+    RawClient raw(bench->socketPath());
+    raw.socket.setReadBufferSize(1);
+    const QByteArray list("{\"jsonrpc\":\"2.0\",\"id\":1,\"method\":\"list\"}\n");
+    const auto enough = 2 * ControlSession::largestBacklog / JsonRpc::resultLine(1, client->call("list").result).size();
+    raw.send(list.repeated(enough) + "{\"jsonrpc\":\"2.0\",\"id\":2,\"method\":\"set\",\"params\":{\"name\":"
+                                     "\"battery.voltage\",\"value\":1}}\n");
+    QTRY_COMPARE_WITH_TIMEOUT(raw.socket.state(), QLocalSocket::UnconnectedState, limit);
+    QTRY_COMPARE_WITH_TIMEOUT(bench->server.findChildren<ControlSession*>().size(), 1, limit);
+    QCOMPARE(bench->registry.value(control), before);
+}
+
 void ControlServerTest::otherRequestsAreAnsweredDuringAWait()
 {
     RawClient raw(bench->socketPath());
@@ -418,6 +434,15 @@ void ControlServerTest::logReturnsTheLinesAfterAMark()
     QCOMPARE(later.size(), 1);
     QCOMPARE(later.first().toObject().value("text"), "three");
     QCOMPARE(later.first().toObject().value("number"), 3);
+}
+
+void ControlServerTest::logRefusesAMarkThatIsNone()
+{
+    for (const auto& mark : {QJsonValue("2"), QJsonValue(-1), QJsonValue(1.5), QJsonValue(true), QJsonValue()}) {
+        const auto reply = client->call("log", {{"after", mark}});
+        QCOMPARE(reply.code, -32602);
+        QCOMPARE(reply.message, "\"after\" takes a whole number from 0");
+    }
 }
 
 void ControlServerTest::keysAndPicturesNeedAProgram()

@@ -162,6 +162,17 @@ void ControlWaitTest::badWaitIsRefused_data()
                                       << "control \"battery.voltage\" takes -2147483648..2147483647 uV";
     QTest::addRow("no text") << QJsonObject{{"log", ""}} << "\"log\" takes a text";
     QTest::addRow("negative time") << QJsonObject{{"log", "x"}, {"within", -1}} << "\"within\" takes 0..86400 seconds";
+    QTest::addRow("value of a region") << QJsonObject{{"region", "rtc"}, {"colour", "red"}, {"value", 1}}
+                                       << "unknown parameter \"value\"; allowed: region, colour, within";
+    QTest::addRow("mark of a control") << QJsonObject{{"control", control}, {"value", 1}, {"after", 1}}
+                                       << "unknown parameter \"after\"; allowed: control, value, within";
+    QTest::addRow("colour of a log line")
+        << QJsonObject{{"log", "x"}, {"colour", "red"}} << "unknown parameter \"colour\"; allowed: log, after, within";
+    const QString mark = "\"after\" takes a whole number from 0";
+    QTest::addRow("mark that is a text") << QJsonObject{{"log", "x"}, {"after", "1"}} << mark;
+    QTest::addRow("mark that is negative") << QJsonObject{{"log", "x"}, {"after", -1}} << mark;
+    QTest::addRow("mark with a fraction") << QJsonObject{{"log", "x"}, {"after", 1.5}} << mark;
+    QTest::addRow("mark that is a switch") << QJsonObject{{"log", "x"}, {"after", true}} << mark;
     QTest::addRow("no time") << QJsonObject{{"log", "x"}, {"within", "1"}} << "\"within\" takes 0..86400 seconds";
 }
 

@@ -5,6 +5,7 @@
 
 #include "virtual-device/registry/ControlTable.h"
 #include "virtual-device/registry/Registry.h"
+#include "virtual-device/registry/Values.h"
 
 #include <QCommandLineParser>
 #include <QJsonArray>
@@ -19,11 +20,6 @@ namespace VirtualDevice
 
 namespace
 {
-
-QString fromView(std::string_view view)
-{
-    return QString::fromUtf8(view.data(), static_cast<qsizetype>(view.size()));
-}
 
 QString typeWord(ControlType type)
 {

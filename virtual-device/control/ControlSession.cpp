@@ -9,6 +9,7 @@
 #include "virtual-device/log/LogStore.h"
 #include "virtual-device/registry/ControlTable.h"
 #include "virtual-device/registry/Registry.h"
+#include "virtual-device/registry/Values.h"
 #include "virtual-device/screen/KeyTable.h"
 #include "virtual-device/screen/RegionMap.h"
 #include "virtual-device/screen/RegionWatch.h"
@@ -33,13 +34,9 @@ using JsonRpc::ErrorCode;
 constexpr qint64 longestHold = 600'000;
 constexpr double longestWait = 86'400;
 constexpr double usualWait = 10;
+constexpr qint64 lastNumber = 1LL << 53; ///< the largest that a JSON number counts to without a gap
 
 const QStringList allKinds{"control", "log", "region", "monitor"};
-
-QString fromView(std::string_view view)
-{
-    return QString::fromUtf8(view.data(), static_cast<qsizetype>(view.size()));
-}
 
 Error wrong(const QString& message)
 {
@@ -83,10 +80,12 @@ Error notConnected()
     return {ErrorCode::Unavailable, "the program shows no window", QJsonValue::Undefined};
 }
 
-bool isWholeNumberWithin(const QJsonValue& value, double minimum, double maximum)
+/// "after" is the number of the last log line that is known already; 0 or nothing: none is.
+std::optional<Error> wrongMark(const QJsonObject& params)
 {
-    const double number = value.toDouble();
-    return value.isDouble() && std::trunc(number) == number && number >= minimum && number <= maximum;
+    if (!params.contains("after") || isWholeNumberWithin(params.value("after"), 0, lastNumber))
+        return std::nullopt;
+    return wrong(QStringLiteral("\"after\" takes a whole number from 0"));
 }
 
 } // namespace
@@ -129,8 +128,12 @@ ControlSession::ControlSession(QLocalSocket* client, const ControlContext& reach
 void ControlSession::receive()
 {
     splitter.append(socket->readAll());
-    while (const auto line = splitter.next())
+    while (!isAbandoned) {
+        const auto line = splitter.next();
+        if (!line)
+            return;
         handle(*line);
+    }
 }
 
 void ControlSession::handle(const LineSplitter::Line& line)
@@ -178,10 +181,12 @@ void ControlSession::answer(const QJsonValue& id, const Outcome& outcome)
 
 void ControlSession::send(const QByteArray& line)
 {
-    if (socket->bytesToWrite() > largestBacklog)
+    if (socket->bytesToWrite() > largestBacklog) {
+        isAbandoned = true;
         socket->abort();
-    else
+    } else if (socket->state() == QLocalSocket::ConnectedState) {
         socket->write(line);
+    }
 }
 
 void ControlSession::sendEvent(const QString& kind, QJsonObject event)
@@ -278,6 +283,8 @@ ControlSession::Outcome ControlSession::regions(const JsonRpc::Request& /*reques
 
 ControlSession::Outcome ControlSession::log(const JsonRpc::Request& request)
 {
+    if (auto error = wrongMark(request.params))
+        return *error;
     QJsonArray lines;
     for (const auto& line : context.log.linesAfter(request.params.value("after").toInteger()))
         lines.append(logObject(line));
@@ -306,33 +313,58 @@ ControlSession::Outcome ControlSession::wait(const JsonRpc::Request& request)
 
 std::optional<Error> ControlSession::condition(PendingWait& pending, const QJsonObject& params)
 {
-    const bool hasRegion = params.contains("region");
-    const bool hasControl = params.contains("control");
-    const bool hasLog = params.contains("log");
-    if (int(hasRegion) + int(hasControl) + int(hasLog) != 1)
+    using Check = std::optional<Error> (ControlSession::*)(PendingWait&, const QJsonObject&);
+    struct Condition
+    {
+        const char* name;
+        QStringList members;
+        Check check;
+    };
+    static const std::array<Condition, 3> conditions{{
+        {"region", {"region", "colour", "within"}, &ControlSession::regionCondition},
+        {"control", {"control", "value", "within"}, &ControlSession::controlCondition},
+        {"log", {"log", "after", "within"}, &ControlSession::logCondition},
+    }};
+    const auto isGiven = [&](const Condition& row) { return params.contains(QLatin1String(row.name)); };
+    if (std::count_if(conditions.begin(), conditions.end(), isGiven) != 1)
         return wrong(R"(one of "region", "control" and "log" says what to wait for)");
-    if (hasRegion) {
-        const QString colour = params.value("colour").toString();
-        if (RegionMap::find(params.value("region").toString()) == nullptr)
-            return wrong(QStringLiteral("unknown region \"%1\"; regions: %2")
-                             .arg(params.value("region").toString(), RegionMap::names().join(", ")));
-        if (!RegionMap::words().contains(colour))
-            return wrong(
-                QStringLiteral("unknown colour \"%1\"; colours: %2").arg(colour, RegionMap::words().join(", ")));
-        pending.forRegion(context.regions, params.value("region").toString(), colour);
-    } else if (hasControl) {
-        const QString name = params.value("control").toString();
-        const ControlSpec* const spec = Registry::find(name);
-        if (spec == nullptr)
-            return unknownControl(name);
-        if (!Registry::accepts(*spec, params.value("value")))
-            return wrong(QStringLiteral("control \"%1\" takes %2").arg(name, Registry::allowed(*spec)));
-        pending.forControl(context.registry, name, params.value("value"));
-    } else {
-        if (params.value("log").toString().isEmpty())
-            return wrong("\"log\" takes a text");
-        pending.forLog(context.log, params.value("log").toString(), params.value("after").toInteger());
-    }
+    const auto* const given = std::find_if(conditions.begin(), conditions.end(), isGiven);
+    if (auto error = unknownMember(params, given->members))
+        return error;
+    return (this->*given->check)(pending, params);
+}
+
+std::optional<Error> ControlSession::regionCondition(PendingWait& pending, const QJsonObject& params)
+{
+    const QString region = params.value("region").toString();
+    const QString colour = params.value("colour").toString();
+    if (RegionMap::find(region) == nullptr)
+        return wrong(QStringLiteral("unknown region \"%1\"; regions: %2").arg(region, RegionMap::names().join(", ")));
+    if (!RegionMap::words().contains(colour))
+        return wrong(QStringLiteral("unknown colour \"%1\"; colours: %2").arg(colour, RegionMap::words().join(", ")));
+    pending.forRegion(context.regions, region, colour);
+    return std::nullopt;
+}
+
+std::optional<Error> ControlSession::controlCondition(PendingWait& pending, const QJsonObject& params)
+{
+    const QString name = params.value("control").toString();
+    const ControlSpec* const spec = Registry::find(name);
+    if (spec == nullptr)
+        return unknownControl(name);
+    if (!Registry::accepts(*spec, params.value("value")))
+        return wrong(QStringLiteral("control \"%1\" takes %2").arg(name, Registry::allowed(*spec)));
+    pending.forControl(context.registry, name, params.value("value"));
+    return std::nullopt;
+}
+
+std::optional<Error> ControlSession::logCondition(PendingWait& pending, const QJsonObject& params)
+{
+    if (params.value("log").toString().isEmpty())
+        return wrong("\"log\" takes a text");
+    if (auto error = wrongMark(params))
+        return error;
+    pending.forLog(context.log, params.value("log").toString(), params.value("after").toInteger());
     return std::nullopt;
 }
 

@@ -21,7 +21,10 @@ namespace VirtualDevice
 class PendingWait;
 
 /// One client of the control socket. Owns the socket and deletes itself when the client goes; a wait that is under way
-/// ends with it, a key that it holds is released all the same.
+/// ends with it, a key that it holds is released all the same. A client that does not read its answers is cut off, and
+/// what it asked in the same breath is not carried out.
+///
+/// Threads: lives in the main thread, with everything that its context names.
 class ControlSession : public QObject
 {
     Q_OBJECT
@@ -67,7 +70,11 @@ private:
     Outcome wait(const JsonRpc::Request& request);
     Outcome events(const JsonRpc::Request& request);
 
+    /// Each returns what is wrong with the parameters; nothing: the wait is under way.
     [[nodiscard]] std::optional<JsonRpc::Error> condition(PendingWait& pending, const QJsonObject& params);
+    [[nodiscard]] std::optional<JsonRpc::Error> regionCondition(PendingWait& pending, const QJsonObject& params);
+    [[nodiscard]] std::optional<JsonRpc::Error> controlCondition(PendingWait& pending, const QJsonObject& params);
+    [[nodiscard]] std::optional<JsonRpc::Error> logCondition(PendingWait& pending, const QJsonObject& params);
     void subscribe();
 
     QLocalSocket* socket;
@@ -75,6 +82,7 @@ private:
     LineSplitter splitter{longestLine};
     QStringList kinds;
     bool isSubscribed = false;
+    bool isAbandoned = false; ///< a client that reads too slowly gets no further answers
 };
 
 } // namespace VirtualDevice

@@ -4,11 +4,11 @@
 #include "virtual-device/registry/Registry.h"
 
 #include "virtual-device/registry/ControlTable.h"
+#include "virtual-device/registry/Values.h"
 
 #include <QStringList>
 
 #include <algorithm>
-#include <cmath>
 
 namespace VirtualDevice
 {
@@ -16,21 +16,9 @@ namespace VirtualDevice
 namespace
 {
 
-QString fromView(std::string_view view)
-{
-    return QString::fromUtf8(view.data(), static_cast<qsizetype>(view.size()));
-}
-
 QStringList choicesOf(const ControlSpec& spec)
 {
     return fromView(spec.choices).split(u'|');
-}
-
-bool isWholeNumberWithin(const QJsonValue& value, std::int64_t minimum, std::int64_t maximum)
-{
-    const double number = value.toDouble();
-    return value.isDouble() && std::trunc(number) == number && number >= static_cast<double>(minimum) &&
-           number <= static_cast<double>(maximum);
 }
 
 } // namespace

@@ -78,7 +78,9 @@ std::optional<QString> missingPlugin()
     const QString plugin = QLibraryInfo::path(QLibraryInfo::PluginsPath) + QStringLiteral("/platforms/libqvnc.so");
     if (QFile::exists(plugin))
         return std::nullopt;
-    return QStringLiteral("Qt's VNC platform plugin %1 is missing: install the package libqt6gui6").arg(plugin);
+    return QStringLiteral("Qt's VNC platform plugin %1 is missing: install the package "
+                          "qt6-qpa-plugins")
+        .arg(plugin);
 }
 
 } // namespace

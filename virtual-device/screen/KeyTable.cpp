@@ -3,6 +3,8 @@
 
 #include "virtual-device/screen/KeyTable.h"
 
+#include "virtual-device/registry/Values.h"
+
 #include <array>
 #include <string_view>
 
@@ -36,11 +38,6 @@ constexpr std::array rows{
     Row{"Tab", 0xff09},
     Row{"Space", 0x20},
 };
-
-QString fromView(std::string_view view)
-{
-    return QString::fromLatin1(view.data(), static_cast<qsizetype>(view.size()));
-}
 
 } // namespace
 

@@ -3,6 +3,8 @@
 
 #include "virtual-device/screen/RegionMap.h"
 
+#include "virtual-device/registry/Values.h"
+
 #include <QHash>
 
 #include <algorithm>
@@ -37,7 +39,9 @@ constexpr std::array map{
     Region{"trigger", 0, 220, 120, 18, "TriggerTest/connectedLabel", "green while triggers arrive each second"},
     Region{"sd-card", 120, 220, 120, 18, "SdCardTest/connectedLabel", "green while the card and its file are well"},
     Region{"rf", 0, 237, 240, 83, "RfTest/", "the radio panel"},
+    Region{"rf.frequency.label", 4, 243, 74, 14, "RfTest/label_2", "the frequency's name"},
     Region{"rf.frequency", 92, 243, 56, 14, "RfTest/labelFrequencyValue", "frequency of the test packet"},
+    Region{"rf.power.label", 4, 283, 64, 14, "RfTest/label", "the power's name"},
     Region{"rf.power", 85, 283, 60, 14, "RfTest/labelPowerValue", "power of the test packet"},
     Region{"rf.transmitting", 158, 243, 74, 17, "RfTest/labelTransmitting", "the transmission's animation"},
     Region{"rf.beacon", 157, 268, 74, 20, "RfTest/labelBeacon", "green while the radio controller answers"},
@@ -63,11 +67,6 @@ constexpr std::array named{
 };
 
 constexpr std::array<std::string_view, 5> colourWords{"none", "green", "red", "white", "other"};
-
-QString fromView(std::string_view view)
-{
-    return QString::fromLatin1(view.data(), static_cast<qsizetype>(view.size()));
-}
 
 QHash<QRgb, int> histogram(const QImage& picture, const QRect& area)
 {

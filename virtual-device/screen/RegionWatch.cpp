@@ -3,6 +3,7 @@
 
 #include "virtual-device/screen/RegionWatch.h"
 
+#include "virtual-device/registry/Values.h"
 #include "virtual-device/screen/Screen.h"
 
 #include <utility>
@@ -29,7 +30,7 @@ void RegionWatch::look(const QRect& area)
     for (const auto& region : RegionMap::regions()) {
         if (!region.rectangle().intersects(area))
             continue;
-        const QString name = QString::fromUtf8(region.name.data(), static_cast<qsizetype>(region.name.size()));
+        const QString name = fromView(region.name);
         const RegionColour now = RegionMap::dominantColour(picture, region.rectangle());
         if (std::exchange(colours[name], now) != now)
             emit changed(name, now);

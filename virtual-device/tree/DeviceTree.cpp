@@ -4,6 +4,7 @@
 #include "virtual-device/tree/DeviceTree.h"
 
 #include "virtual-device/registry/Registry.h"
+#include "virtual-device/registry/Values.h"
 #include "virtual-device/tree/Faults.h"
 
 #include <fcntl.h>
@@ -23,11 +24,6 @@ namespace
 
 constexpr off_t attributeSize = 4096; ///< what the kernel claims for every attribute
 constexpr qsizetype hugeSize = 1 << 20;
-
-QString nameOf(std::string_view view)
-{
-    return QString::fromLatin1(view.data(), static_cast<qsizetype>(view.size()));
-}
 
 QByteArray everyByte()
 {
@@ -238,16 +234,16 @@ void DeviceTree::unmount()
 
 int DeviceTree::fault(const TreeEntry& entry) const
 {
-    return entry.fault.empty() ? 0 : errorNumber(registry.text(nameOf(entry.fault)));
+    return entry.fault.empty() ? 0 : errorNumber(registry.text(fromView(entry.fault)));
 }
 
 /// The clock is bound into the sandbox by itself: its name stays, and only opening it says that it is gone.
 bool DeviceTree::isThere(const TreeEntry& entry) const
 {
-    if (!entry.presence.empty() && !registry.flag(nameOf(entry.presence)))
+    if (!entry.presence.empty() && !registry.flag(fromView(entry.presence)))
         return false;
     if (entry.kind == TreeEntry::Kind::Folder)
-        return entry.fault.empty() || registry.text(nameOf(entry.fault)) != u"dangling";
+        return entry.fault.empty() || registry.text(fromView(entry.fault)) != u"dangling";
     return entry.kind == TreeEntry::Kind::Clock || fault(entry) != ENOENT;
 }
 
@@ -286,7 +282,7 @@ int DeviceTree::refresh(OpenFile& file) const
 QByteArray DeviceTree::contentOf(const TreeEntry& entry) const
 {
     const QByteArray value = entry.show(registry);
-    const QString choice = entry.content.empty() ? QString() : registry.text(nameOf(entry.content));
+    const QString choice = entry.content.empty() ? QString() : registry.text(fromView(entry.content));
     if (choice == u"empty")
         return {};
     if (choice == u"binary")
