@@ -24,6 +24,9 @@ private slots:
     void runtimeFolderOfSomebodyElseIsNotUsed();
     void unnamedDevicesTakeTheFirstFreeNumber();
     void nameThatIsTakenIsRefused();
+    void lockThatCannotBeMadeIsNotTakenForARunningDevice_data();
+    void lockThatCannotBeMadeIsNotTakenForARunningDevice();
+    void whereEveryNumberIsTakenNothingIsTouched();
     void nameCanBeTakenAgainAfterRelease();
     void names_data();
     void names();
@@ -107,6 +110,42 @@ void DeviceFolderTest::nameThatIsTakenIsRefused()
     QCOMPARE(first.claim("bench"), std::nullopt);
     QCOMPARE(second.claim("bench"), QString("a device named \"bench\" is running: choose another name with --name"));
     QVERIFY(QDir(first.path()).exists());
+}
+
+void DeviceFolderTest::lockThatCannotBeMadeIsNotTakenForARunningDevice_data()
+{
+    QTest::addColumn<QString>("asked");
+    QTest::addColumn<QString>("lock");
+    QTest::addRow("named") << "bench"
+                           << "bench.lock";
+    QTest::addRow("unnamed") << ""
+                             << "device-1.lock";
+}
+
+void DeviceFolderTest::lockThatCannotBeMadeIsNotTakenForARunningDevice()
+{
+    QFETCH(const QString, asked);
+    QFETCH(const QString, lock);
+    const QString path = DeviceFolder::root() + '/' + lock;
+    QVERIFY(QFile::link("/nowhere", path)); // a link is never followed
+    DeviceFolder folder;
+    QCOMPARE(folder.claim(asked), path + ": cannot be made: Too many levels of symbolic links");
+}
+
+/// The folders belong to whoever holds the locks.
+void DeviceFolderTest::whereEveryNumberIsTakenNothingIsTouched()
+{
+    DeviceFolder first;
+    QCOMPARE(first.claim({}), std::nullopt);
+    const QByteArray held = first.path().toLocal8Bit() + ".lock";
+    for (int number = 2; number <= 1000; ++number)
+        QCOMPARE(::link(held.constData(), qPrintable(DeviceFolder::root() + QString("/device-%1.lock").arg(number))),
+                 0);
+    const QString last = DeviceFolder::root() + "/device-1000/state";
+    QVERIFY(QDir().mkpath(last));
+    DeviceFolder another;
+    QCOMPARE(another.claim({}), QString("1000 devices are running: end one, or choose a name with --name"));
+    QVERIFY(QDir(last).exists());
 }
 
 void DeviceFolderTest::nameCanBeTakenAgainAfterRelease()

@@ -7,8 +7,10 @@
 
 #include <QDir>
 #include <QFileInfo>
+#include <QLibraryInfo>
 #include <QProcess>
 #include <QRegularExpression>
+#include <QStandardPaths>
 #include <QTcpServer>
 #include <QTemporaryDir>
 #include <QTest>
@@ -149,7 +151,9 @@ private slots:
     void wrongUse_data();
     void wrongUse();
     void programThatDoesNotExistIsReported();
+    void missingPackageIsNamed_data();
     void missingPackageIsNamed();
+    void missingPluginIsNamedWithItsPackage();
     void missingFuseIsNamed();
     void closedFuseIsNamed();
     void forbiddenNamespacesAreNamed();
@@ -374,6 +378,11 @@ void VirtualDeviceCommandTest::wrongUse_data()
     QTest::addRow("unknown option") << QStringList{"run", "--fly"};
     QTest::addRow("argument of the program") << QStringList{"run", "argument"};
     QTest::addRow("port that is none") << QStringList{"run", "--vnc-port", "70000"};
+    QTest::addRow("control that there is not") << QStringList{"run", "--set", "nothing=1"};
+    QTest::addRow("control that is read only") << QStringList{"run", "--set", "led.power_latch=1"};
+    QTest::addRow("value out of range") << QStringList{"exec", "--set", "trigger.period=-1", "--", "true"};
+    QTest::addRow("setting without a value") << QStringList{"exec", "--set", "usb.hid", "--", "true"};
+    QTest::addRow("name that is none") << QStringList{"run", "--name", "a/b"};
     QTest::addRow("no command") << QStringList{"exec"};
 }
 
@@ -393,11 +402,45 @@ void VirtualDeviceCommandTest::programThatDoesNotExistIsReported()
     QCOMPARE(outcome.errors, "virtual-device: /nothing is no program: build it, or name one with --program\n");
 }
 
+void VirtualDeviceCommandTest::missingPackageIsNamed_data()
+{
+    QTest::addColumn<QStringList>("present");
+    QTest::addColumn<QString>("missing");
+    QTest::addRow("bwrap") << QStringList{} << "the program bwrap is missing: install the package bubblewrap";
+    QTest::addRow("socat") << QStringList{"bwrap"} << "the program socat is missing: install the package socat";
+    QTest::addRow("fusermount3") << QStringList{"bwrap", "socat"}
+                                 << "the program fusermount3 is missing: install the package fuse3";
+}
+
+/// To an ordinary user: root does without fusermount3.
 void VirtualDeviceCommandTest::missingPackageIsNamed()
 {
-    const auto outcome = outcomeOf("/usr/bin/env", {"PATH=/nothing", VIRTUAL_DEVICE, "exec", "--", "true"});
+    QFETCH(const QStringList, present);
+    QFETCH(const QString, missing);
+    const QTemporaryDir path;
+    for (const auto& name : present)
+        QVERIFY(QFile::link(QStandardPaths::findExecutable(name), path.filePath(name)));
+    const auto outcome = outcomeOf("bwrap", {"--unshare-user", "--uid", "1000", "--dev-bind", "/", "/", "--setenv",
+                                             "PATH", path.path(), VIRTUAL_DEVICE, "exec", "--", "true"});
     QCOMPARE(outcome.status, 1);
-    QCOMPARE(outcome.errors, "virtual-device: the program bwrap is missing: install the package bubblewrap\n");
+    QCOMPARE(outcome.errors, "virtual-device: " + missing + '\n');
+}
+
+void VirtualDeviceCommandTest::missingPluginIsNamedWithItsPackage()
+{
+    REQUIRE_FUSE();
+    const QString folder = QLibraryInfo::path(QLibraryInfo::PluginsPath) + "/platforms";
+    const QString plugin = folder + "/libqvnc.so";
+    QVERIFY(QFile::exists(plugin));
+    const auto outcome =
+        outcomeOf("bwrap", {"--dev-bind", "/", "/", "--tmpfs", folder, VIRTUAL_DEVICE, "exec", "--", "true"});
+    QCOMPARE(outcome.status, 1);
+    QCOMPARE(outcome.errors, "virtual-device: Qt's VNC platform plugin " + plugin +
+                                 " is missing: install the package qt6-qpa-plugins\n");
+    // Where the system knows, it agrees.
+    const auto owner = outcomeOf("dpkg-query", {"--search", plugin});
+    if (owner.status == 0)
+        QVERIFY2(owner.output.startsWith("qt6-qpa-plugins"), qPrintable(owner.output));
 }
 
 void VirtualDeviceCommandTest::missingFuseIsNamed()

@@ -13,6 +13,20 @@
 namespace VirtualDevice
 {
 
+namespace
+{
+
+/// What can be told from the words alone, before anything is started.
+std::optional<QString> wrongWord(const DeviceOptions& options)
+{
+    if (auto problem = options.name.isEmpty() ? std::nullopt : DeviceFolder::nameProblem(options.name))
+        return problem;
+    Registry trial;
+    return Device::apply(options.settings, trial);
+}
+
+} // namespace
+
 DeviceSession::DeviceSession(const DeviceOptions& options) : virtualDevice(options)
 {
     QObject::connect(&endSignals, &EndSignals::requested, &virtualDevice, [this] {
@@ -44,6 +58,8 @@ std::optional<int> DeviceSession::parse(QCommandLineParser& parser, const QStrin
     options.name = parser.value("name");
     options.stateFolder = parser.value("state");
     options.settings = parser.values("set");
+    if (const auto problem = wrongWord(options))
+        return complain(*problem, ExitStatus::wrongUse);
     return std::nullopt;
 }
 

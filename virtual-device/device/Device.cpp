@@ -68,7 +68,7 @@ Device::~Device()
 std::optional<QString> Device::start()
 {
     DeviceFolder::cleanUp();
-    auto problem = applySettings();
+    auto problem = apply(options.settings, values);
     if (!problem)
         problem = deviceFolder.claim(options.name);
     if (!problem)
@@ -80,13 +80,13 @@ std::optional<QString> Device::start()
     return problem;
 }
 
-std::optional<QString> Device::applySettings()
+std::optional<QString> Device::apply(const QStringList& settings, Registry& registry)
 {
-    for (const auto& setting : std::as_const(options.settings)) {
+    for (const auto& setting : settings) {
         const QString name = setting.section(u'=', 0, 0);
         const ControlSpec* control = Registry::find(name);
         const QJsonValue value = control ? Registry::parsed(*control, setting.section(u'=', 1)) : QJsonValue();
-        if (auto problem = values.set(name, value))
+        if (auto problem = registry.set(name, value))
             return problem;
     }
     return std::nullopt;

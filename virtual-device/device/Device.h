@@ -51,6 +51,9 @@ public:
     explicit Device(DeviceOptions options, QObject* parent = nullptr);
     ~Device() override;
 
+    /// Gives controls the values of "NAME=VALUE" words. Returns what is wrong with the first that is refused.
+    [[nodiscard]] static std::optional<QString> apply(const QStringList& settings, Registry& registry);
+
     /// Makes the device and starts the program in it. Returns what went wrong; nothing is left then.
     [[nodiscard]] std::optional<QString> start();
     /// Asks the program to end; `ended` follows.
@@ -76,7 +79,6 @@ signals:
     void ended(int status);
 
 private:
-    [[nodiscard]] std::optional<QString> applySettings();
     [[nodiscard]] std::optional<QString> makeFiles();
     [[nodiscard]] std::optional<QString> startSandbox();
     [[nodiscard]] SandboxPlan plan() const;

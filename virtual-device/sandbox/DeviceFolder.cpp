@@ -13,6 +13,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <filesystem>
 
 namespace VirtualDevice
@@ -54,17 +55,23 @@ bool isLockedBySomebody(int descriptor)
     return ::fcntl(descriptor, F_OFD_GETLK, &request) == 0 && request.l_type != F_UNLCK;
 }
 
-/// The lock's descriptor, or -1 when somebody holds it or the file cannot be made.
-int lockedFile(const QString& path)
+struct LockAttempt
+{
+    int descriptor = -1;
+    int error = 0; ///< without a descriptor: 0 where somebody holds the lock, or why the file cannot be made
+};
+
+LockAttempt lockedFile(const QString& path)
 {
     auto request = wholeFile();
     for (;;) {
         const int descriptor = ::open(native(path).constData(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600);
         if (descriptor < 0)
-            return -1;
+            return {-1, errno};
         if (::fcntl(descriptor, F_OFD_SETLK, &request) != 0) {
+            const int error = errno == EAGAIN || errno == EACCES ? 0 : errno;
             ::close(descriptor);
-            return -1;
+            return {-1, error};
         }
         struct stat held
         {
@@ -75,7 +82,7 @@ int lockedFile(const QString& path)
         // The last owner may have removed the file between our open and our lock.
         if (::fstat(descriptor, &held) == 0 && ::stat(native(path).constData(), &named) == 0 &&
             held.st_ino == named.st_ino)
-            return descriptor;
+            return {descriptor, 0};
         ::close(descriptor);
     }
 }
@@ -163,11 +170,18 @@ bool DeviceFolder::isName(const QString& name)
     return allowed.match(name).hasMatch();
 }
 
+std::optional<QString> DeviceFolder::nameProblem(const QString& name)
+{
+    if (isName(name))
+        return std::nullopt;
+    return QStringLiteral("\"%1\" is no device name: letters, digits, \"-\" and \"_\", at most 24").arg(name);
+}
+
 QStringList DeviceFolder::cleanUp()
 {
     QStringList cleaned;
     for (const auto& name : knownNames()) {
-        const int descriptor = lockedFile(lockPath(name));
+        const int descriptor = lockedFile(lockPath(name)).descriptor;
         if (descriptor < 0)
             continue;
         removeFolder(root() + u'/' + name);
@@ -179,21 +193,35 @@ QStringList DeviceFolder::cleanUp()
 
 std::optional<QString> DeviceFolder::claim(const QString& name)
 {
-    if (!name.isEmpty() && !isName(name))
-        return QStringLiteral("\"%1\" is no device name: letters, digits, \"-\" and \"_\", at most 24").arg(name);
+    if (auto problem = name.isEmpty() ? std::nullopt : nameProblem(name))
+        return problem;
     ::mkdir(native(root()).constData(), 0700);
     if (!isPrivateFolder(root()))
         return QStringLiteral("%1 is not a folder of this user with mode 0700: remove it").arg(root());
-    for (int number = 1; number <= mostDevices && lock < 0; ++number) {
-        deviceName = name.isEmpty() ? QStringLiteral("device-%1").arg(number) : name;
-        lock = lockedFile(lockPath(deviceName));
-        if (lock < 0 && !name.isEmpty())
+    if (auto problem = takeName(name))
+        return problem;
+    removeFolder(path());
+    if (::mkdir(native(path()).constData(), 0700) != 0)
+        return QStringLiteral("%1: cannot make the device's folder: %2").arg(path(), qt_error_string(errno));
+    return std::nullopt;
+}
+
+std::optional<QString> DeviceFolder::takeName(const QString& name)
+{
+    for (int number = 1; number <= mostDevices; ++number) {
+        const QString candidate = name.isEmpty() ? QStringLiteral("device-%1").arg(number) : name;
+        const auto attempt = lockedFile(lockPath(candidate));
+        if (attempt.error != 0)
+            return QStringLiteral("%1: cannot be made: %2").arg(lockPath(candidate), qt_error_string(attempt.error));
+        if (attempt.descriptor >= 0) {
+            deviceName = candidate;
+            lock = attempt.descriptor;
+            return std::nullopt;
+        }
+        if (!name.isEmpty())
             return QStringLiteral("a device named \"%1\" is running: choose another name with --name").arg(name);
     }
-    removeFolder(path());
-    if (lock < 0 || ::mkdir(native(path()).constData(), 0700) != 0)
-        return QStringLiteral("%1: cannot make the device's folder").arg(path());
-    return std::nullopt;
+    return QStringLiteral("%1 devices are running: end one, or choose a name with --name").arg(mostDevices);
 }
 
 void DeviceFolder::release()

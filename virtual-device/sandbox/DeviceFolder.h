@@ -33,6 +33,8 @@ public:
     [[nodiscard]] static QString controlSocket(const QString& name);
     /// Letters, digits, "-" and "_", at most 24 of them.
     [[nodiscard]] static bool isName(const QString& name);
+    /// What is wrong with a name that somebody chose.
+    [[nodiscard]] static std::optional<QString> nameProblem(const QString& name);
 
     /// Unmounts and removes what devices left that were killed; returns their names.
     static QStringList cleanUp();
@@ -48,6 +50,8 @@ public:
     [[nodiscard]] QString path(const QString& relative = {}) const;
 
 private:
+    [[nodiscard]] std::optional<QString> takeName(const QString& name);
+
     QString deviceName;
     int lock = -1;
 };
