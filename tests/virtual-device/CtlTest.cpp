@@ -6,9 +6,11 @@
 #include "virtual-device/sandbox/DeviceFolder.h"
 #include "virtual-device/screen/RegionMap.h"
 
+#include <QDir>
 #include <QFile>
 #include <QJsonArray>
 #include <QJsonDocument>
+#include <QLocalServer>
 #include <QProcess>
 #include <QTest>
 
@@ -20,7 +22,7 @@ using TestSupport::ControlBench;
 namespace
 {
 
-constexpr int limit = 20000;
+constexpr int limit = 60000;
 
 QString program()
 {
@@ -97,6 +99,7 @@ private slots:
     void waitEndsWithZeroWhenItComesTrue();
     void waitEndsWithOneWhenItDoesNotInTime();
     void waitEndsWithOneWhenTheDeviceGoes();
+    void deviceThatDoesNotAnswerIsNotWaitedForWithoutEnd();
     void waitForALogText();
     void logPrintsWhatIsThere();
     void logFollowPrintsEachLineOnceAndEndsWithTheDevice();
@@ -280,6 +283,22 @@ void CtlTest::waitEndsWithOneWhenTheDeviceGoes()
     QVERIFY(QTest::qWaitFor([this] { return !bench->server.children().isEmpty(); }, limit));
     QTimer::singleShot(300, &bench->monitor, [this] { bench->server.close(); });
     QCOMPARE(waiting.finish().status, 1);
+}
+
+/// It is there, but stopped.
+void CtlTest::deviceThatDoesNotAnswerIsNotWaitedForWithoutEnd()
+{
+    QLocalServer silent;
+    const QString socket = QDir::tempPath() + "/silent";
+    QVERIFY(silent.listen(socket));
+    Ctl get({"get", "usb.hid"}, socket);
+    Ctl hold({"hold", "F5", "10"}, socket);
+    Ctl wait({"wait", "log", "x", "--within", "0.1"}, socket);
+    for (auto [ctl, status] : {std::pair{&get, 2}, std::pair{&hold, 2}, std::pair{&wait, 1}}) {
+        const auto result = ctl->finish();
+        QCOMPARE(result.status, status);
+        QCOMPARE(result.error, "virtual-device ctl: the virtual device did not answer\n");
+    }
 }
 
 void CtlTest::waitForALogText()

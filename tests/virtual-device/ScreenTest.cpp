@@ -4,6 +4,7 @@
 #include "virtual-device/screen/Screen.h"
 
 #include "tests/virtual-device/SampleProgram.h"
+#include "tests/virtual-device/Terminal.h"
 #include "virtual-device/control/LiveTable.h"
 #include "virtual-device/registry/Registry.h"
 #include "virtual-device/screen/KeyTable.h"
@@ -24,6 +25,7 @@
 
 using namespace VirtualDevice;
 using TestSupport::SampleProgram;
+using TestSupport::Terminal;
 
 namespace
 {
@@ -55,6 +57,8 @@ private slots:
     void signalLineArrivesAgainAndAgainUntilItIsSwitchedOff();
     void signalLineThatIsSetBeforeTheProgramStandsArrivesThen();
     void tableOnATerminalIsRedrawnWhenAColourChanges();
+    void terminalThatTakesNothingHoldsNobodyUp();
+    void terminalThatGoesAwayHoldsNobodyUp();
     void frozenProgramHoldsNobodyUp();
     void screenEndsWhileTheProgramIsFrozenInTheHandshake();
 
@@ -301,6 +305,31 @@ void ScreenTest::tableOnATerminalIsRedrawnWhenAColourChanges()
     QVERIFY(written.startsWith("\x1b[" + QByteArray::number(rows) + "A\r"));
     ::close(ends[0]);
     ::close(ends[1]);
+}
+
+/// Stopped, as by Ctrl-S: the table comes when the terminal goes on, and is up to date then.
+void ScreenTest::terminalThatTakesNothingHoldsNobodyUp()
+{
+    Terminal terminal;
+    QVERIFY(terminal.isOpen());
+    terminal.stop();
+    const LiveTable table(*regions, terminal.end(), "heading\n");
+    QVERIFY(screen->press("Down"));
+    QTRY_COMPARE_WITH_TIMEOUT(regions->colour("key.down"), RegionColour::Green, limit);
+    QCOMPARE(terminal.shown(), QByteArray());
+    terminal.goOn();
+    QTRY_VERIFY_WITH_TIMEOUT(terminal.shown().contains("key.down            \x1b[30;42mgreen  \x1b[0m"), limit);
+    QVERIFY(terminal.shown().startsWith("heading\r\n"));
+    QCOMPARE(::fcntl(terminal.end(), F_GETFL) & O_NONBLOCK, 0);
+}
+
+void ScreenTest::terminalThatGoesAwayHoldsNobodyUp()
+{
+    auto terminal = std::make_unique<Terminal>();
+    const LiveTable table(*regions, terminal->end());
+    terminal.reset();
+    QVERIFY(screen->press("Down"));
+    QTRY_COMPARE_WITH_TIMEOUT(regions->colour("key.down"), RegionColour::Green, limit);
 }
 
 void ScreenTest::frozenProgramHoldsNobodyUp()

@@ -2,7 +2,9 @@
 // SPDX-License-Identifier: MIT
 
 #include "tests/virtual-device/FuseTest.h"
+#include "tests/virtual-device/Terminal.h"
 #include "virtual-device/sandbox/DeviceFolder.h"
+#include "virtual-device/screen/RegionMap.h"
 #include "virtual-device/tree/Mounts.h"
 
 #include <QDir>
@@ -133,6 +135,8 @@ private slots:
     void init();
     void cleanup();
     void readyLineNamesTheScreenAndTheControlSocket();
+    void onATerminalATableOfTheRegionsFollows();
+    void terminalThatTakesNothingHoldsNobodyUp();
     void askedToEndItTakesEverythingDown_data();
     void askedToEndItTakesEverythingDown();
     void nextStartCleansUpAfterOneThatWasKilled();
@@ -189,6 +193,44 @@ void VirtualDeviceCommandTest::readyLineNamesTheScreenAndTheControlSocket()
     device.signal(SIGTERM);
     QVERIFY(device.process.waitForFinished(limit));
     QCOMPARE(device.process.readAll(), QByteArray()); // no terminal: one line and nothing more
+}
+
+void VirtualDeviceCommandTest::onATerminalATableOfTheRegionsFollows()
+{
+    REQUIRE_FUSE();
+    TestSupport::Terminal terminal;
+    QVERIFY(terminal.isOpen());
+    QProcess process;
+    process.setStandardOutputFile(terminal.name());
+    process.start(VIRTUAL_DEVICE, {"run", "--program", WINDOW_PROGRAM, "--name", "bench"});
+    QTRY_VERIFY_WITH_TIMEOUT(terminal.shown().count('\n') > 1, limit);
+    QVERIFY2(terminal.shown().startsWith("ready: VNC 127.0.0.1:"), terminal.shown());
+    for (const auto& region : VirtualDevice::RegionMap::names())
+        QTRY_VERIFY_WITH_TIMEOUT(terminal.shown().contains(region.toUtf8() + ' '), limit);
+    process.terminate();
+    QVERIFY(process.waitForFinished(limit));
+    QCOMPARE(process.exitCode(), 0);
+}
+
+/// The window stands, but nobody takes the line that says so: the device can be used and ended all the same.
+void VirtualDeviceCommandTest::terminalThatTakesNothingHoldsNobodyUp()
+{
+    REQUIRE_FUSE();
+    TestSupport::Terminal terminal;
+    QVERIFY(terminal.isOpen());
+    terminal.stop();
+    QProcess process;
+    process.setStandardOutputFile(terminal.name());
+    process.start(VIRTUAL_DEVICE, {"run", "--program", WINDOW_PROGRAM, "--name", "bench"});
+    const auto answers = [] {
+        return virtualDevice({"ctl", "--device", "bench", "wait", "region", "trigger", "green"}).status == 0;
+    };
+    QVERIFY(QTest::qWaitFor(answers, limit));
+    QCOMPARE(virtualDevice({"ctl", "--device", "bench", "get", "usb.hid"}).output, "true\n");
+    process.terminate();
+    QVERIFY(process.waitForFinished(limit));
+    QCOMPARE(process.exitCode(), 0);
+    QCOMPARE(terminal.shown(), QByteArray());
 }
 
 void VirtualDeviceCommandTest::askedToEndItTakesEverythingDown_data()

@@ -14,7 +14,7 @@ target_link_libraries(WindowSample PRIVATE ProjectOptions TestSupport)
 target_precompile_headers(WindowSample REUSE_FROM TestSupport)
 
 immunityrig_test(ScreenTest
-  SOURCES virtual-device/ScreenTest.cpp virtual-device/SampleProgram.cpp virtual-device/SampleProgram.h
+  SOURCES virtual-device/ScreenTest.cpp virtual-device/SampleProgram.cpp virtual-device/SampleProgram.h virtual-device/Terminal.h
   LIBRARIES VirtualDevice LABELS unit)
 add_dependencies(ScreenTest WindowSample)
 immunityrig_test(ScreenDisturbanceTest

@@ -39,9 +39,9 @@ std::optional<QString> chooseProgram(const QCommandLineParser& parser, DeviceOpt
     return std::nullopt;
 }
 
-void announce(const Device& device)
+QString announcement(const Device& device)
 {
-    QTextStream(stdout) << "ready: VNC " << device.vncAddress() << ", control " << device.controlSocket() << Qt::endl;
+    return QStringLiteral("ready: VNC %1, control %2\n").arg(device.vncAddress(), device.controlSocket());
 }
 
 /// Each line as it comes: whoever reads the file while the program runs sees what it has printed so far.
@@ -93,9 +93,10 @@ int runCommand(const QStringList& arguments)
         return DeviceSession::complain(*problem, ExitStatus::failure);
     std::optional<LiveTable> table;
     QObject::connect(&session.device(), &Device::ready, [&] {
-        announce(session.device());
         if (::isatty(STDOUT_FILENO) != 0)
-            table.emplace(session.device().regions(), STDOUT_FILENO);
+            table.emplace(session.device().regions(), STDOUT_FILENO, announcement(session.device()).toLocal8Bit());
+        else
+            QTextStream(stdout) << announcement(session.device());
     });
     QObject::connect(&session.device(), &Device::ended, [&](int status) {
         if (status != 0 && !session.isAskedToEnd())

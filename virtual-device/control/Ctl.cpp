@@ -19,6 +19,8 @@
 
 #include <algorithm>
 #include <array>
+#include <chrono>
+#include <cmath>
 #include <cstdio>
 
 namespace VirtualDevice
@@ -30,6 +32,9 @@ namespace
 constexpr int done = 0;
 constexpr int notInTime = 1;
 constexpr int wrongUse = 2;
+/// A device that works answers at once; what a request takes by itself comes on top.
+constexpr std::chrono::milliseconds answerLimit(10'000);
+constexpr std::chrono::milliseconds longestDuration(86'400'000); ///< the device refuses what is longer
 
 int complain(const QString& text)
 {
@@ -125,6 +130,12 @@ private:
     };
     static const std::array<Command, 11> commands;
 
+    [[nodiscard]] ControlReply call(const QString& method, const QJsonObject& params = {},
+                                    std::chrono::milliseconds duration = {})
+    {
+        return client.call(method, params, answerLimit + std::clamp(duration, {}, longestDuration));
+    }
+
     [[nodiscard]] QString argument(int index) const { return request.words.at(index); }
 
     /// Prints the result, or what was refused.
@@ -143,7 +154,7 @@ private:
 
     int list()
     {
-        const auto reply = client.call("list");
+        const auto reply = call("list");
         QStringList lines;
         for (const auto& row : reply.result.toArray()) {
             const auto control = row.toObject();
@@ -158,25 +169,24 @@ private:
 
     int get()
     {
-        const auto reply = client.call("get", {{"name", argument(0)}});
+        const auto reply = call("get", {{"name", argument(0)}});
         return finish(reply, word(reply.result));
     }
 
-    int set()
-    {
-        return finish(client.call("set", {{"name", argument(0)}, {"value", typed(argument(0), argument(1))}}));
-    }
-    int press() { return finish(client.call("press", {{"key", argument(0)}})); }
-    int release() { return finish(client.call("release", {{"key", argument(0)}})); }
+    int set() { return finish(call("set", {{"name", argument(0)}, {"value", typed(argument(0), argument(1))}})); }
+    int press() { return finish(call("press", {{"key", argument(0)}})); }
+    int release() { return finish(call("release", {{"key", argument(0)}})); }
 
     int hold()
     {
-        return finish(client.call("hold", {{"key", argument(0)}, {"milliseconds", numberOrWord(argument(1))}}));
+        const QJsonValue duration = numberOrWord(argument(1));
+        return finish(call("hold", {{"key", argument(0)}, {"milliseconds", duration}},
+                           std::chrono::milliseconds(duration.toInteger())));
     }
 
     int screenshot()
     {
-        const auto reply = client.call("screenshot");
+        const auto reply = call("screenshot");
         if (!reply.isOk())
             return finish(reply);
         QSaveFile file(argument(0));
@@ -188,7 +198,7 @@ private:
 
     int regions()
     {
-        const auto reply = client.call("regions");
+        const auto reply = call("regions");
         QStringList lines;
         for (const auto& row : reply.result.toArray())
             lines.append(QStringLiteral("%1 %2")
@@ -218,8 +228,8 @@ private:
                 early.append(line);
         });
         if (request.follows)
-            static_cast<void>(client.call("events", {{"kinds", QJsonArray{"log"}}}));
-        const auto reply = client.call("log");
+            static_cast<void>(call("events", {{"kinds", QJsonArray{"log"}}}));
+        const auto reply = call("log");
         for (const auto& line : reply.result.toArray())
             show(line.toObject());
         isCaughtUp = true;
@@ -244,7 +254,9 @@ private:
         } else {
             params.insert("log", argument(1));
         }
-        const auto reply = client.call("wait", params);
+        const double most = std::chrono::duration<double>(longestDuration).count();
+        const double seconds = request.within > 0 ? std::min(request.within, most) : 0;
+        const auto reply = call("wait", params, std::chrono::milliseconds(std::llround(seconds * 1000)));
         // The device went: what was waited for will never come true.
         if (reply.code == ControlClient::connectionLost) {
             complain(reply.message);
@@ -260,7 +272,7 @@ private:
         QObject::connect(&client, &ControlClient::notified, &loop, [this](const QString&, const QJsonObject& event) {
             print(request.isJson ? json(event) : eventText(event));
         });
-        const auto reply = client.call("events");
+        const auto reply = call("events");
         if (!reply.isOk())
             return finish(reply);
         loop.exec();

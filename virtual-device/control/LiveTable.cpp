@@ -5,9 +5,15 @@
 
 #include "virtual-device/screen/RegionWatch.h"
 
+#include <QSocketNotifier>
+
+#include <fcntl.h>
+#include <poll.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
+#include <cerrno>
 
 namespace VirtualDevice
 {
@@ -19,6 +25,7 @@ constexpr std::chrono::milliseconds shortestPause(100);
 constexpr int nameWidth = 20;
 constexpr int colourWidth = 7;
 constexpr int columns = 2;
+constexpr qsizetype largestPiece = 128;
 
 /// In the order of `RegionColour`.
 constexpr std::array<const char*, 5> escapes{"\x1b[2m", "\x1b[30;42m", "\x1b[97;41m", "\x1b[30;47m", "\x1b[0m"};
@@ -29,22 +36,33 @@ QByteArray cell(const QString& name, RegionColour colour)
            RegionMap::word(colour).leftJustified(colourWidth).toUtf8() + "\x1b[0m  ";
 }
 
-void writeAll(int descriptor, const QByteArray& bytes)
+/// The terminal by a descriptor that never blocks. The one that we were given stays as it is: the mode belongs to the
+/// terminal's other users as well, such as the shell.
+int openedAgain(int terminal)
 {
-    for (qsizetype written = 0; written < bytes.size();) {
-        const auto count =
-            ::write(descriptor, bytes.constData() + written, static_cast<size_t>(bytes.size() - written));
-        if (count <= 0)
-            return;
-        written += count;
-    }
+    const auto name = "/proc/self/fd/" + QByteArray::number(terminal);
+    const int own = ::open(name.constData(), O_WRONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC);
+    // Somebody else's terminal (su, sudo) cannot be opened; in small pieces it hardly ever blocks.
+    return own >= 0 ? own : ::fcntl(terminal, F_DUPFD_CLOEXEC, 0);
+}
+
+/// Also one that has gone: writing to it tells.
+bool takesSomething(int descriptor)
+{
+    pollfd request{descriptor, POLLOUT, 0};
+    return ::poll(&request, 1, 0) == 1;
 }
 
 } // namespace
 
-LiveTable::LiveTable(RegionWatch& watched, int terminal, QObject* parent)
-    : QObject(parent), regions(watched), descriptor(terminal)
+LiveTable::LiveTable(RegionWatch& watched, int terminal, const QByteArray& heading, QObject* parent)
+    : QObject(parent),
+      regions(watched),
+      descriptor(openedAgain(terminal)),
+      writable(std::make_unique<QSocketNotifier>(descriptor, QSocketNotifier::Write)),
+      pending(heading)
 {
+    connect(writable.get(), &QSocketNotifier::activated, this, &LiveTable::flush);
     pause.setSingleShot(true);
     pause.setInterval(shortestPause);
     connect(&pause, &QTimer::timeout, this, &LiveTable::draw);
@@ -59,6 +77,8 @@ LiveTable::~LiveTable()
 {
     if (pause.isActive())
         draw();
+    writable.reset();
+    ::close(descriptor);
 }
 
 QByteArray LiveTable::lines() const
@@ -76,12 +96,35 @@ QByteArray LiveTable::lines() const
 
 void LiveTable::draw()
 {
-    const QByteArray table = lines();
-    QByteArray bytes;
+    isStale = drawnLines > 0 && !pending.isEmpty();
+    if (isStale)
+        return;
     if (drawnLines > 0)
-        bytes = "\x1b[" + QByteArray::number(drawnLines) + "A\r";
+        pending = "\x1b[" + QByteArray::number(drawnLines) + "A\r";
+    const QByteArray table = lines();
     drawnLines = static_cast<int>(table.count('\n'));
-    writeAll(descriptor, bytes + table);
+    pending += table;
+    flush();
+}
+
+void LiveTable::flush()
+{
+    while (!pending.isEmpty() && takesSomething(descriptor)) {
+        const auto size = std::min(pending.size(), largestPiece);
+        const auto count = ::write(descriptor, pending.constData(), static_cast<size_t>(size));
+        if (count < 0 && errno == EAGAIN) { // room, but less than a line end needs
+            writable->setEnabled(false);
+            QTimer::singleShot(shortestPause, this, &LiveTable::flush);
+            return;
+        }
+        if (count < 0)
+            pending.clear(); // nobody is there any more
+        else
+            pending.remove(0, count);
+    }
+    writable->setEnabled(!pending.isEmpty());
+    if (pending.isEmpty() && isStale)
+        draw();
 }
 
 } // namespace VirtualDevice
