@@ -11,7 +11,10 @@ if(NOT DSPLINK_ROOT)
   immunityrig_test(DspPortCallsTest SOURCES Domain/DspPortCallsTest.cpp support/InstantDsp.cpp support/InstantDsp.h
     LIBRARIES Domain DspLink LABELS unit)
 endif()
-immunityrig_test(DspPortTest SOURCES Domain/DspPortTest.cpp Domain/DspTestParts.h LIBRARIES Domain DspLink LABELS integration)
+foreach(test IN ITEMS DspPortTest DspPortReadingTest)
+  immunityrig_test(${test} SOURCES Domain/${test}.cpp Domain/DspPortFixture.h Domain/DspTestParts.h
+    LIBRARIES Domain DspLink LABELS integration)
+endforeach()
 immunityrig_test(DspPortOpeningTest SOURCES Domain/DspPortOpeningTest.cpp LIBRARIES Domain LABELS integration)
 immunityrig_test(DspTest SOURCES Domain/DspTest.cpp LIBRARIES Domain LABELS integration)
 immunityrig_test(DspReceiveTest SOURCES Domain/DspReceiveTest.cpp LIBRARIES Domain LABELS integration)
