@@ -12,6 +12,8 @@ class QWidget;
 
 /// What the polls show, written to a widget only when it differs from what stands there: a style sheet that is set
 /// again is parsed and polished again, and a number that is set again is painted again, every second and for nothing.
+///
+/// Threads: the GUI thread.
 namespace Presentation::WidgetUpdates
 {
 

@@ -48,7 +48,7 @@ private:
 
 LogWriter& LogWriter::instance()
 {
-    // Never destroyed: objects with static storage duration may still log while the process ends.
+    // Never destroyed: objects with static storage duration may still call it while the process ends.
     static auto* const writer = new LogWriter;
     return *writer;
 }

@@ -22,8 +22,9 @@ namespace Utilities
 /// Threads: every operation may be called from any thread. Each waits until its request has been carried out, but all
 /// callers together wait at most `patience` for a service that hangs; until the service moves again nobody waits.
 /// The queue holds `capacity` requests; a request that finds it full is dropped.
-/// At the end of the process the writer waits `patience` for what is still queued. A service that hangs even then is
-/// left behind with its thread: the exit of the process ends both.
+/// At the end of the process the writer waits `patience` for what is still queued; what is logged after that, by
+/// objects with static storage duration, is dropped: `syslog` itself might block the exit. A service that hangs even
+/// then is left behind with its thread: the exit of the process ends both.
 class LogWriter
 {
 public:

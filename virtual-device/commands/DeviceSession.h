@@ -14,6 +14,8 @@ namespace VirtualDevice
 {
 
 /// What `run` and `exec` have in common: a device from its start to the end of what runs in it.
+///
+/// Threads: lives in the main thread.
 class DeviceSession
 {
 public:

@@ -12,6 +12,8 @@ namespace VirtualDevice
 {
 
 /// The control table as people and machines read it.
+///
+/// Threads: no state; any thread.
 class ControlDescription
 {
 public:

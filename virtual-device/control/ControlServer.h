@@ -5,7 +5,6 @@
 
 #include "virtual-device/control/ControlContext.h"
 
-#include <QHash>
 #include <QLocalServer>
 #include <QObject>
 #include <QString>

@@ -11,6 +11,8 @@ namespace VirtualDevice
 
 /// The command line of `virtual-device ctl`, taken apart and checked for its form; names and values are the device's
 /// to judge.
+///
+/// Threads: a value; one owner, any thread.
 struct CtlRequest
 {
     QString problem; ///< what is wrong; empty when nothing is

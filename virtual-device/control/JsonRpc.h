@@ -23,6 +23,8 @@ namespace VirtualDevice::JsonRpc
 /// | -32602 | a parameter is missing, unknown or out of range; the text says |
 /// | -32000 | a wait that did not come true in its time                      |
 /// | -32001 | not now: the screen is not connected                           |
+///
+/// Threads: no state; any thread.
 enum class ErrorCode
 {
     ParseError = -32700,

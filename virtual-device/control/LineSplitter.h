@@ -13,6 +13,8 @@ namespace VirtualDevice
 /// Cuts a byte stream into lines that end in a line feed (a carriage return before it is dropped), however the bytes
 /// arrive. A line longer than the limit is not kept: it comes out once, marked, when its end arrives, so that its
 /// sender can be told and nothing of it is mistaken for a message.
+///
+/// Threads: a value; one owner, any thread.
 class LineSplitter
 {
 public:

@@ -11,6 +11,8 @@ namespace VirtualDevice
 {
 
 /// Every control of the virtual device, in the order in which the documentation lists them.
+///
+/// Threads: any; the table is constant.
 [[nodiscard]] std::span<const ControlSpec> controlTable();
 
 } // namespace VirtualDevice

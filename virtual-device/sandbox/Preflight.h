@@ -12,6 +12,8 @@ namespace VirtualDevice
 
 /// What this machine lacks for running a virtual device, as one line that says what to do; nothing when it lacks
 /// nothing. Starts nothing that stays.
+///
+/// Threads: any; waits for the programs that it tries.
 [[nodiscard]] std::optional<QString> missingPrerequisite();
 
 } // namespace VirtualDevice

@@ -20,7 +20,7 @@ namespace VirtualDevice
 {
 
 /// The running sandbox: bubblewrap, the program in it and everything that the program starts. It ends as a whole, with
-/// the program, with `stop()`, or with the virtual device's own end, however that comes about.
+/// the program, with `kill()`, or with the virtual device's own end, however that comes about.
 ///
 /// Threads: lives in the main thread.
 class Sandbox : public QObject
@@ -43,7 +43,8 @@ public:
     [[nodiscard]] std::optional<QString> start(const SandboxPlan& plan, Streams streams);
     [[nodiscard]] bool isRunning() const { return process.state() != QProcess::NotRunning; }
 
-    /// Asks the program to end (SIGTERM) and kills it when it has not done so within `grace`. `ended` follows.
+    /// Asks the program to end (SIGTERM) and kills it when it has not done so within four seconds. `ended`
+    /// follows.
     void terminate();
     /// Ends everything now; returns when no process of the sandbox is left.
     void kill();

@@ -29,6 +29,8 @@ struct SandboxBind
 
 /// What the program's surroundings consist of beyond the fixed ones (private /dev, /sys, /tmp, /mnt, the system's
 /// libraries and fonts read-only, no network). Each part of the device adds its own to it before the start.
+///
+/// Threads: a value; one owner, any thread.
 struct SandboxPlan
 {
     QList<SandboxBind> binds;

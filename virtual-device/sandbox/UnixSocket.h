@@ -17,6 +17,8 @@ struct BoundSocket
 
 /// A Unix socket of `type` (SOCK_DGRAM, SOCK_STREAM, SOCK_SEQPACKET) bound at `path` with mode 0600, closed on exec,
 /// replacing a socket left there. Not listening yet.
+///
+/// Threads: any.
 [[nodiscard]] BoundSocket boundUnixSocket(const QString& path, int type);
 
 } // namespace VirtualDevice

@@ -16,6 +16,8 @@ namespace VirtualDevice
 /// "Trigger") or as on a keyboard ("F5", "F10"); letters and digits as themselves. Case does not matter.
 ///
 /// The codes are those of the remote framebuffer protocol (X key symbols).
+///
+/// Threads: no state; any thread.
 class KeyTable
 {
 public:

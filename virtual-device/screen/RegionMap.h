@@ -43,6 +43,8 @@ struct Region
 };
 
 /// Where each part of the window is, and what colour it has.
+///
+/// Threads: no state; any thread.
 class RegionMap
 {
 public:

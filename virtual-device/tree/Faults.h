@@ -9,6 +9,8 @@ namespace VirtualDevice
 {
 
 /// The error number that a fault control names ("EIO"), 0 for every word that is none ("none", "garbage").
+///
+/// Threads: any.
 [[nodiscard]] int errorNumber(const QString& fault);
 
 } // namespace VirtualDevice

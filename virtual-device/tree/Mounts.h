@@ -9,6 +9,8 @@
 namespace VirtualDevice
 {
 
+// Threads: any; the calls wait for the kernel, and for `fusermount3`.
+
 /// Mount points at or below `folder` in this process's mount namespace, deepest first.
 [[nodiscard]] QStringList mountedBelow(const QString& folder);
 

@@ -18,7 +18,7 @@ class Registry;
 /// The device's real-time clock: runs on from whatever `rtc.time` was last set to, stands still while `rtc.running` is
 /// off, and shows itself in `rtc.time` once a second.
 ///
-/// Threads: lives in the main thread; `read()` and `readError()` may be called from any.
+/// Threads: lives in the main thread; `seconds()` and `read()` may be called from any.
 class RealTimeClock : public QObject
 {
     Q_OBJECT

@@ -14,6 +14,8 @@ namespace VirtualDevice
 class Registry;
 
 /// One entry of the served tree and the controls that steer it. Folders follow from the paths.
+///
+/// Threads: the table is constant; `show` is called from the file system's threads.
 struct TreeEntry
 {
     enum class Kind
