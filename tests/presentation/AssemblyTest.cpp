@@ -14,6 +14,11 @@
 #include <QSlider>
 #include <QTest>
 
+#include <fcntl.h>
+#include <stdlib.h>
+#include <termios.h>
+#include <unistd.h>
+
 using Presentation::TestGui;
 using TestSupport::child;
 using TestSupport::ObjectRecorder;
@@ -23,6 +28,7 @@ namespace
 {
 
 const QString sound = QStringLiteral("/etc/sounds/TestSound.wav");
+const QString radioLine = QStringLiteral("/dev/ttyS1");
 
 /// Devices and tests in the order of their construction; the screen, which is the first, goes by its object name.
 const QStringList members{"TestGui",
@@ -89,7 +95,11 @@ class AssemblyTest : public QObject
     Q_OBJECT
 
 private slots:
-    void cleanup() { TestSupport::removePath(sound); }
+    void cleanup()
+    {
+        TestSupport::removePath(sound);
+        TestSupport::removePath(radioLine);
+    }
 
     void devicesAndTestsAreBuiltInTheirOrderAndDestroyedInReverse()
     {
@@ -100,6 +110,19 @@ private slots:
         recorder.watch(built, members);
         bench.gui.reset();
         QCOMPARE(recorder.destroyed(), QStringList(members.rbegin(), members.rend()));
+    }
+
+    void theRadiosLineRunsAt115200Baud()
+    {
+        const int line = ::posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
+        QVERIFY(line >= 0 && ::unlockpt(line) == 0);
+        QVERIFY(QFile::link(QString::fromLocal8Bit(::ptsname(line)), radioLine));
+        const Bench bench;
+        termios settings{};
+        QCOMPARE(::tcgetattr(line, &settings), 0);
+        ::close(line);
+        QCOMPARE(::cfgetospeed(&settings), speed_t(B115200));
+        QCOMPARE(::cfgetispeed(&settings), speed_t(B115200));
     }
 
     void theDspsTestsAreSwitchedOnBeforeTheRadioPanelStarts()

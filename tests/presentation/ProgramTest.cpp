@@ -145,6 +145,34 @@ private slots:
         QCOMPARE(program.state(), QProcess::Running);
     }
 
+    void argumentsGoToTheToolkit()
+    {
+        const LogCapture log;
+        Program program;
+        auto environment = program.processEnvironment();
+        environment.remove(QStringLiteral("QT_QPA_PLATFORM"));
+        program.setProcessEnvironment(environment);
+        program.setArguments({QStringLiteral("-platform"), QStringLiteral("offscreen")});
+        program.start();
+        QVERIFY(log.waitFor(started));
+        QVERIFY(pollsAgain());
+        QCOMPARE(program.state(), QProcess::Running);
+    }
+
+    /// The toolkit refuses in the application object.
+    void saysThatItStartsBeforeTheToolkitDoes()
+    {
+        const LogCapture log;
+        Program program;
+        program.setArguments({QStringLiteral("-platform"), QStringLiteral("nonsense")});
+        program.start();
+        QTRY_COMPARE_WITH_TIMEOUT(program.state(), QProcess::NotRunning, patienceMs);
+        QCOMPARE(program.exitStatus(), QProcess::CrashExit);
+        QVERIFY(program.readAllStandardError().contains("nonsense"));
+        QVERIFY(log.waitFor(started));
+        QCOMPARE(log.texts(), QStringList{started});
+    }
+
     void goesOnWhenItsWindowIsClosed()
     {
         Program program;
@@ -162,6 +190,20 @@ private slots:
         program.startWithScreenProbe();
         QVERIFY(hasScreenReport());
         QVERIFY(TestSupport::readFile(screenReport).startsWith("QT_QPA_FB_FORCE_FULLSCREEN=0\n"));
+    }
+
+    /// Texts fit their regions, whatever the surroundings say of the display and the toolkit of its default font.
+    void textIsAsLargeAsTheLayoutWasMadeFor()
+    {
+        Program program;
+        auto environment = program.processEnvironment();
+        environment.insert(QStringLiteral("QT_FONT_DPI"), QStringLiteral("300"));
+        program.setProcessEnvironment(environment);
+        program.startWithScreenProbe();
+        QVERIFY(hasScreenReport());
+        const QByteArray report = TestSupport::readFile(screenReport);
+        QVERIFY2(report.contains("\nQT_FONT_DPI=96\n"), report);
+        QVERIFY2(report.contains("\npoints=9\n"), report);
     }
 
     /// What is logged after the log has been closed carries the name of the program.

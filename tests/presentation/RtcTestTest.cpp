@@ -106,6 +106,17 @@ private slots:
         QCOMPARE(TestSupport::readFile(clockFile), QByteArray("no clock"));
     }
 
+    /// The clock is opened as its driver is used: for reading and writing.
+    void aClockThatMayOnlyBeReadIsNotOpened()
+    {
+        TestSupport::writeFile(clockFile, "no clock");
+        QVERIFY(QFile::setPermissions(clockFile, QFile::ReadOwner | QFile::ReadGroup | QFile::ReadOther));
+        const TestSupport::DebugOutput output;
+        RtcTest test(nullptr);
+        test.start();
+        QCOMPARE(output.texts(), QStringList({openFailed, readFailed}));
+    }
+
     void aFailedReadShowsNoInventedTime()
     {
         RtcTest test(nullptr);

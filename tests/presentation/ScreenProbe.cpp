@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 
 #include <QFile>
+#include <QFont>
 #include <QGenericPlugin>
 #include <QGuiApplication>
 #include <QTimer>
@@ -12,7 +13,8 @@
 namespace
 {
 
-/// Closes the window, as the user of a desktop would, after writing down what the framebuffer's plugin goes by. The end
+/// Closes the window, as the user of a desktop would, after writing down what the framebuffer's plugin and the layouts
+/// go by. The end
 /// of the window goes to the log.
 void lookAt(QWindow& window)
 {
@@ -21,6 +23,8 @@ void lookAt(QWindow& window)
     if (!report.open(QIODevice::WriteOnly))
         qFatal("no place for the report");
     report.write("QT_QPA_FB_FORCE_FULLSCREEN=" + qgetenv("QT_QPA_FB_FORCE_FULLSCREEN") + '\n');
+    report.write("QT_FONT_DPI=" + qgetenv("QT_FONT_DPI") + '\n');
+    report.write("points=" + QByteArray::number(QGuiApplication::font().pointSizeF()) + '\n');
     report.write("closed=" + QByteArray::number(int(window.close())) + '\n');
     report.close();
     report.rename(QStringLiteral("/mnt/screen-probe"));

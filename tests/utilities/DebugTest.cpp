@@ -48,7 +48,7 @@ private slots:
     void fatalBeforeTheEventLoopEndsNothing();
     void messagesFromManyThreadsAllArrive();
     void messagesAfterCloseStillArriveUnderTheProgramsName();
-    void everyMessageIsEchoedOnStandardError();
+    void everyMessageIsEchoedOnStandardErrorBeforeItsCallReturns();
     void withoutALogServiceMessagesGoToTheConsole();
     void aServiceThatTakesNothingHoldsNobodyUp();
 };
@@ -222,7 +222,7 @@ void DebugTest::messagesAfterCloseStillArriveUnderTheProgramsName()
     QCOMPARE(log.lines().front().identity, "DebugTest");
 }
 
-void DebugTest::everyMessageIsEchoedOnStandardError()
+void DebugTest::everyMessageIsEchoedOnStandardErrorBeforeItsCallReturns()
 {
     const LogCapture log;
     Debug::open();
@@ -231,13 +231,19 @@ void DebugTest::everyMessageIsEchoedOnStandardError()
     const int standardError = ::dup(STDERR_FILENO);
     ::dup2(ends[1], STDERR_FILENO);
     Debug::info("brief");
-    Debug::warningMessage("f", 1, "composed");
+    Debug::debugBrief("detail");
+    Debug::debugMessage("f", 1, "debug");
+    Debug::warningMessage("f", 2, "warning");
+    Debug::criticalMessage("f", 3, "critical");
+    Debug::fatalMessage("f", 4, "fatal");
+    // What were echoed after its call had returned would miss the pipe.
     ::dup2(standardError, STDERR_FILENO);
     ::close(standardError);
     ::close(ends[1]);
     QFile echo;
     QVERIFY(echo.open(ends[0], QIODevice::ReadOnly, QFile::AutoCloseHandle));
-    QCOMPARE(echo.readAll(), QByteArray("VQK: brief\nVQK: f, 1, composed\n"));
+    QCOMPARE(echo.readAll(), QByteArray("VQK: brief\nVQK: detail\nVQK: f, 1, debug\nVQK: f, 2, warning\n"
+                                        "VQK: f, 3, critical\nVQK: f, 4, fatal\n"));
 }
 
 void DebugTest::withoutALogServiceMessagesGoToTheConsole()

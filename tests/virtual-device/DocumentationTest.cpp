@@ -4,6 +4,7 @@
 #include "virtual-device/control/ControlDescription.h"
 #include "virtual-device/control/CtlParser.h"
 
+#include <QDir>
 #include <QFile>
 #include <QProcess>
 #include <QRegularExpression>
@@ -29,6 +30,7 @@ class DocumentationTest : public QObject
 
 private slots:
     void controlsPageIsTheControlTable();
+    void manualIsWellFormed_data();
     void manualIsWellFormed();
     void manualNamesEveryRequestAndOption();
 };
@@ -39,10 +41,21 @@ void DocumentationTest::controlsPageIsTheControlTable()
              "the control table has changed: build the target \"controls-page\" and commit docs/controls.md");
 }
 
+void DocumentationTest::manualIsWellFormed_data()
+{
+    QTest::addColumn<QString>("page");
+    const QDir folder(SOURCE_FOLDER "/docs/man");
+    const auto pages = folder.entryList(QDir::Files);
+    QVERIFY(pages.contains("virtual-device.1") && pages.contains("immunityrig.1"));
+    for (const auto& page : pages)
+        QTest::addRow("%s", qPrintable(page)) << folder.filePath(page);
+}
+
 void DocumentationTest::manualIsWellFormed()
 {
+    QFETCH(const QString, page);
     QProcess mandoc;
-    mandoc.start("mandoc", {"-T", "lint", "-W", "warning", SOURCE_FOLDER "/docs/man/virtual-device.1"});
+    mandoc.start("mandoc", {"-T", "lint", "-W", "warning", page});
     QVERIFY(mandoc.waitForFinished());
     QCOMPARE(QString::fromUtf8(mandoc.readAllStandardOutput()), QString());
     QCOMPARE(mandoc.exitCode(), 0);
