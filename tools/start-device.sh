@@ -7,6 +7,7 @@
 # shellcheck shell=sh
 start_device() {
   device="$build/virtual-device/virtual-device" name=$1-$$ folder=$(mktemp -d)
+  : >"$folder/output"
   "$device" run --name "$name" >"$folder/output" 2>&1 &
   runner=$!
   trap 'kill "$runner" 2>/dev/null || true; wait "$runner" || true; rm -rf "$folder"' EXIT
