@@ -149,7 +149,7 @@ void DspPeer::handle(const QByteArray& packet)
     MessageHandler receiver;
     {
         const std::lock_guard lock(mutex);
-        seenMessages.append(message);
+        seenMessages.push_back(message);
         receiver = handler;
     }
     if (receiver)
@@ -163,7 +163,7 @@ void DspPeer::handleRequest(Kind kind, quint32 serial, const QByteArray& payload
     {
         const std::lock_guard lock(mutex);
         receiver = requestHandler;
-        seenRequests.append({kind, payload});
+        seenRequests.push_back({kind, payload});
         if (kind == QueueOpen && payload.mid(4) == "GPPMSGQ1")
             queueOfHost = numberOf<quint32>(payload, 0);
         if (silent.contains(kind)) {
@@ -241,7 +241,7 @@ void DspPeer::hangUp()
 QList<DspPeer::Request> DspPeer::requests() const
 {
     const std::lock_guard lock(mutex);
-    return seenRequests;
+    return {seenRequests.begin(), seenRequests.end()};
 }
 
 QList<DspPeer::Kind> DspPeer::requestKinds() const
@@ -255,7 +255,7 @@ QList<DspPeer::Kind> DspPeer::requestKinds() const
 QList<DspPeer::HostMessage> DspPeer::messages() const
 {
     const std::lock_guard lock(mutex);
-    return seenMessages;
+    return {seenMessages.begin(), seenMessages.end()};
 }
 
 bool DspPeer::isConnected() const

@@ -14,6 +14,7 @@
 #include <mutex>
 #include <optional>
 #include <thread>
+#include <vector>
 
 namespace TestSupport
 {
@@ -123,8 +124,8 @@ private:
     std::map<quint16, quint32> answers;
     QSet<quint16> silent;
     QList<quint32> waitingLocates;
-    QList<Request> seenRequests;
-    QList<HostMessage> seenMessages;
+    std::vector<Request> seenRequests; ///< not shared with the copies that the test gets
+    std::vector<HostMessage> seenMessages;
     MessageHandler handler;
     RequestHandler requestHandler;
     std::thread thread;
