@@ -45,3 +45,6 @@ add_dependencies(ProgramTest ScreenProbe)
 immunityrig_test(RtcOnDeviceTest ON_DEVICE SOURCES presentation/RtcOnDeviceTest.cpp
   LIBRARIES PresentationTestSupport DeviceTestSupport Presentation LABELS presentation)
 add_dependencies(RtcOnDeviceTest virtual-device)
+immunityrig_test(StartScriptTest SOURCES presentation/StartScriptTest.cpp LABELS presentation)
+target_compile_definitions(StartScriptTest PRIVATE
+  START_SCRIPT="${PROJECT_SOURCE_DIR}/presentation/start-immunityrig.sh")
