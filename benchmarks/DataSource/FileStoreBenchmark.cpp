@@ -80,7 +80,7 @@ void rescan(benchmark::State& state)
     std::uintmax_t bytes = standardLibraryWalk(); // the kernel knows the directory from here on
     Seconds walks{};
     Seconds scans{};
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto iteration : state) {
         const auto start = Clock::now();
         bytes = standardLibraryWalk();
         const auto walked = Clock::now();
@@ -104,7 +104,7 @@ void page(benchmark::State& state)
     FileStore store(FullDirectory::of(manyFiles).path());
     int position = static_cast<int>(state.range(0));
     benchmark::DoNotOptimize(store.fileAt(position));
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto iteration : state) {
         for (int row = 0; row < 10; ++row)
             benchmark::DoNotOptimize(store.fileAt(++position));
     }
@@ -116,7 +116,7 @@ void farMiss(benchmark::State& state)
 {
     FileStore store(FullDirectory::of(manyFiles).path());
     int step = 0;
-    for (auto _ : state)
+    for ([[maybe_unused]] auto iteration : state)
         benchmark::DoNotOptimize(store.fileAt(10'000 + 100 * (step = 1 - step)));
 }
 BENCHMARK(farMiss)->Unit(benchmark::kMicrosecond);
@@ -124,7 +124,7 @@ BENCHMARK(farMiss)->Unit(benchmark::kMicrosecond);
 void hit(benchmark::State& state)
 {
     FileStore store(FullDirectory::of(manyFiles).path());
-    for (auto _ : state)
+    for ([[maybe_unused]] auto iteration : state)
         benchmark::DoNotOptimize(store.fileAt(7));
 }
 BENCHMARK(hit);
@@ -135,7 +135,7 @@ void memory(benchmark::State& state)
 {
     const auto& directory = FullDirectory::of(static_cast<int>(state.range(0)));
     double heap = 0;
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto iteration : state) {
         const auto before = ::mallinfo2().uordblks;
         const auto store = std::make_unique<FileStore>(directory.path());
         scan(*store);

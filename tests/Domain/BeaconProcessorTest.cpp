@@ -14,7 +14,6 @@
 using Domain::AbstractBeaconProcessor;
 using Domain::BeaconPacket;
 using Domain::BeaconProcessor;
-using TestSupport::generousMs;
 using TestSupport::LogCapture;
 using TestSupport::Pty;
 using TestSupport::Radio;

@@ -14,7 +14,6 @@ using TestSupport::ackType;
 using TestSupport::dataType;
 using TestSupport::DspPeer;
 using TestSupport::nakType;
-using TestSupport::openTexts;
 using TestSupport::sourcedTexts;
 
 /// What the port makes of the DSP's messages, over the host library and a real socket.

@@ -3,7 +3,6 @@
 
 #include "tests/Domain/Pty.h"
 
-#include <QElapsedTimer>
 #include <QFile>
 #include <QTest>
 

@@ -15,7 +15,6 @@
 #include <csignal>
 
 using TestSupport::LogCapture;
-using TestSupport::writeFile;
 
 namespace
 {

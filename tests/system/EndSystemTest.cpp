@@ -5,7 +5,6 @@
 #include "tests/support/ScreenHealth.h"
 #include "virtual-device/sandbox/DeviceFolder.h"
 
-#include <QDeadlineTimer>
 #include <QRegularExpression>
 #include <QTest>
 

@@ -5,7 +5,6 @@
 #include "tests/support/ScreenHealth.h"
 
 #include <QFile>
-#include <QRegularExpression>
 #include <QTest>
 
 using TestSupport::DeviceUnderTest;

@@ -8,7 +8,6 @@
 #include "utilities/SourceWarnings.h"
 
 #include <QCoreApplication>
-#include <QElapsedTimer>
 #include <QFile>
 #include <QTest>
 #include <QTimer>

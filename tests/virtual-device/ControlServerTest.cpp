@@ -8,7 +8,6 @@
 #include "virtual-device/registry/ControlTable.h"
 #include "virtual-device/screen/RegionMap.h"
 
-#include <QElapsedTimer>
 #include <QJsonArray>
 #include <QJsonDocument>
 #include <QLocalSocket>
