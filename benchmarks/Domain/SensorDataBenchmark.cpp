@@ -12,7 +12,7 @@
 #include <QSemaphore>
 
 #include <benchmark/benchmark.h>
-#include <time.h>
+#include <ctime>
 
 #include <algorithm>
 #include <array>
