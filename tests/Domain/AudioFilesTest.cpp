@@ -10,6 +10,7 @@
 #include <sys/stat.h>
 
 using TestSupport::AudioFixture;
+using TestSupport::CompressedWave;
 using TestSupport::loggedTexts;
 using TestSupport::noise;
 using TestSupport::SdlCalls;
@@ -24,7 +25,11 @@ class AudioFilesTest : public AudioFixture
 private slots:
     void unplayableFiles_data();
     void unplayableFiles();
+    void compressedFiles_data();
+    void compressedFiles();
     void unplayableFileStopsWhatPlays();
+    void chunksBeforeTheFormatArePassedOver();
+    void fileThatIsTooLargeIsNotRead();
     void fileUnlinkedAfterOpening();
     void fileReplacedByAPipeDoesNotHang();
     void fileReplacedWhileItPlaysIsHeardNextTime();
@@ -49,6 +54,7 @@ void AudioFilesTest::unplayableFiles_data()
     QTest::addRow("data cut short") << whole.chopped(1);
     QTest::addRow("data missing") << whole.left(44);
     QTest::addRow("unknown encoding") << QByteArray(whole).replace(20, 2, QByteArray("\x55\x00", 2));
+    QTest::addRow("format cut short") << QByteArray(whole).replace(16, 4, QByteArray("\x0e\0\0\0", 4)).remove(34, 2);
     QTest::addRow("13 bits") << QByteArray(whole).replace(34, 2, QByteArray("\x0d\x00", 2));
     QTest::addRow("length beyond everything") << QByteArray(whole).replace(40, 4, QByteArray(4, '\xff'));
     QTest::addRow("other container") << QByteArray(whole).replace(8, 4, "AVI ");
@@ -70,6 +76,30 @@ void AudioFilesTest::unplayableFiles()
     QVERIFY(sound->sounds().front().startsWith(samples));
 }
 
+/// The library would decode them by sizes that come from the file, and divide by one of them.
+void AudioFilesTest::compressedFiles_data()
+{
+    QTest::addColumn<QByteArray>("content");
+    for (const quint16 encoding : {quint16(2), quint16(0x11)}) {
+        const auto row = [encoding](const char* name, CompressedWave wave) {
+            wave.encoding = encoding;
+            QTest::addRow("%s, encoding %d", name, encoding) << wave.file();
+        };
+        row("sound", {});
+        row("block align 0", {.blockAlign = 0});
+        row("block align 1, 65535 samples a block", {.blockAlign = 1, .samplesPerBlock = 0xFFFF});
+        row("no samples in a block", {.samplesPerBlock = 0});
+        row("no extension", {.formatSize = 18});
+        row("no channels", {.channels = 0});
+        row("three channels", {.channels = 3});
+    }
+}
+
+void AudioFilesTest::compressedFiles()
+{
+    unplayableFiles();
+}
+
 void AudioFilesTest::unplayableFileStopsWhatPlays()
 {
     audio->play(wave(noise(4000 * SoundFixture::bufferSize, 1)));
@@ -78,6 +108,30 @@ void AudioFilesTest::unplayableFileStopsWhatPlays()
     QVERIFY(bad.open(QIODevice::ReadOnly));
     playToTheEnd(&bad);
     QVERIFY(!audio->isPlaying());
+}
+
+void AudioFilesTest::chunksBeforeTheFormatArePassedOver()
+{
+    const QByteArray samples = noise(SoundFixture::bufferSize, 1);
+    const QByteArray content = Wave{samples}.file().insert(12, QByteArray("LIST\5\0\0\0notes", 13));
+    QFile file(sound->makeFile("list.wav", content));
+    QVERIFY(file.open(QIODevice::ReadOnly));
+    playToTheEnd(&file);
+    audio.reset();
+    QCOMPARE(sound->sounds().join(), samples);
+}
+
+/// On a damaged medium a file may be of any size.
+void AudioFilesTest::fileThatIsTooLargeIsNotRead()
+{
+    QFile* const file = wave(noise(1000, 1));
+    QVERIFY(QFile::resize(file->fileName(), 64 * 1024 * 1024 + 1));
+    playToTheEnd(file);
+    QCOMPARE(loggedTexts(*log), QStringList{unloadable(file->fileName())});
+    QCOMPARE(SdlCalls::loads.load(), 0);
+    QVERIFY(QFile::resize(file->fileName(), 64 * 1024 * 1024));
+    playToTheEnd(file);
+    QCOMPARE(SdlCalls::loads.load(), 1);
 }
 
 void AudioFilesTest::fileUnlinkedAfterOpening()

@@ -28,6 +28,30 @@ QByteArray Wave::file() const
     return content;
 }
 
+QByteArray CompressedWave::file() const
+{
+    QByteArray format;
+    QDataStream fields(&format, QIODevice::WriteOnly);
+    fields.setByteOrder(QDataStream::LittleEndian);
+    fields << encoding << channels << quint32(16000) << quint32(8110) << blockAlign << quint16(4);
+    fields << quint16(32) << samplesPerBlock << quint16(7);
+    for (const int coefficient : {256, 0, 512, -256, 0, 0, 192, 64, 240, 0, 460, -208, 392, -232})
+        fields << static_cast<qint16>(coefficient);
+    QByteArray content;
+    QDataStream stream(&content, QIODevice::WriteOnly);
+    stream.setByteOrder(QDataStream::LittleEndian);
+    const QByteArray samples(4 * 256, '\0');
+    stream.writeRawData("RIFF", 4);
+    stream << quint32(20 + formatSize + samples.size());
+    stream.writeRawData("WAVEfmt ", 8);
+    stream << formatSize;
+    stream.writeRawData(format.constData(), static_cast<int>(formatSize));
+    stream.writeRawData("data", 4);
+    stream << static_cast<quint32>(samples.size());
+    stream.writeRawData(samples.constData(), static_cast<int>(samples.size()));
+    return content;
+}
+
 QByteArray noise(qsizetype size, quint32 seed)
 {
     QRandomGenerator random(seed);

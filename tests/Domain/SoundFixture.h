@@ -22,6 +22,19 @@ struct Wave
     [[nodiscard]] QByteArray file() const;
 };
 
+/// A WAV file in a compressed encoding, which is 2 or 0x11: four bits a sample, some zeros as samples. Its format chunk
+/// may promise what it likes.
+struct CompressedWave
+{
+    quint16 encoding = 2;
+    quint16 channels = 1;
+    quint16 blockAlign = 256;
+    quint16 samplesPerBlock = 505;
+    quint32 formatSize = 50; ///< of the chunk: with its extension, which the encodings need
+
+    [[nodiscard]] QByteArray file() const;
+};
+
 /// Bytes of which none is 0, so that they stand out from silence; different for each seed.
 [[nodiscard]] QByteArray noise(qsizetype size, quint32 seed);
 

@@ -5,6 +5,7 @@
 
 #include "DataSource/src/AbstractConfigurationData.h"
 #include "Domain/src/DomainLayer/AudioFeed.h"
+#include "Domain/src/DomainLayer/LoadedSound.h"
 #include "Domain/src/DomainLayer/PlayRequests.h"
 #include "utilities/Debug.h"
 #include "utilities/SourceWarnings.h"
@@ -14,14 +15,11 @@
 
 #include <SDL.h>
 #include <alsa/asoundlib.h>
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <atomic>
-#include <cstdio>
 #include <mutex>
+#include <utility>
 
 namespace Domain
 {
@@ -72,40 +70,6 @@ void writeMixerLevel(snd_hctl_t* control, int level)
     snd_hctl_elem_write(volume, value);
 }
 
-/// A stream on a regular file; none for anything else. A pipe that has taken a file's place would keep the thread for
-/// ever.
-SDL_RWops* openedSound(const QByteArray& fileName)
-{
-    const int descriptor = ::open(fileName.constData(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    struct stat status
-    {
-    };
-    if (descriptor >= 0 && ::fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode)) {
-        if (std::FILE* const stream = ::fdopen(descriptor, "rb"))
-            return SDL_RWFromFP(stream, 1);
-    }
-    if (descriptor >= 0)
-        ::close(descriptor);
-    return nullptr;
-}
-
-struct LoadedSound
-{
-    SDL_AudioSpec spec{};
-    Uint8* buffer = nullptr;
-    Uint32 length = 0;
-};
-
-/// Without a buffer when the file cannot be loaded. SDL leaves its results alone on failure and closes the stream.
-LoadedSound loadedSound(const QString& fileName)
-{
-    LoadedSound sound;
-    SDL_RWops* const stream = openedSound(QFile::encodeName(fileName));
-    if (stream == nullptr || SDL_LoadWAV_RW(stream, 1, &sound.spec, &sound.buffer, &sound.length) == nullptr)
-        return {};
-    return sound;
-}
-
 } // namespace
 
 class Audio::PrivateData
@@ -115,13 +79,13 @@ public:
 
     void openDevice();
     void setDeviceVolume(int volume) const;
-    void setSound(const LoadedSound& sound);
-    void startSound(const LoadedSound& sound, const QIODevice* device, unsigned int stopsBefore);
+    void setSound(LoadedSound sound);
+    void startSound(LoadedSound sound, const QIODevice* device, unsigned int stopsBefore);
 
     AbstractConfigurationData& configuration;
     bool initialised = false;
     SDL_AudioSpec spec{};
-    Uint8* soundBuffer = nullptr;
+    LoadedSound::Samples soundBuffer;
     AudioFeed feed;
     /// Held by all who change the sound, outside the callback lock, which guards nothing while no device is open.
     std::mutex mutex;
@@ -165,27 +129,22 @@ void Audio::PrivateData::setDeviceVolume(int volume) const
 }
 
 /// Puts a sound, or none, in place of the present one. The caller holds the mutex.
-void Audio::PrivateData::setSound(const LoadedSound& sound)
+void Audio::PrivateData::setSound(LoadedSound sound)
 {
-    Uint8* previous = nullptr;
-    {
-        const CallbackLock lock;
-        previous = std::exchange(soundBuffer, sound.buffer);
-        feed = {sound.length, sound.buffer};
-    }
-    SDL_FreeWAV(previous);
+    // The previous one goes with the argument, outside the lock.
+    const CallbackLock lock;
+    soundBuffer.swap(sound.samples);
+    feed = {sound.length, soundBuffer.get()};
 }
 
 /// Unless it has been stopped while it was being loaded.
-void Audio::PrivateData::startSound(const LoadedSound& sound, const QIODevice* device, unsigned int stopsBefore)
+void Audio::PrivateData::startSound(LoadedSound sound, const QIODevice* device, unsigned int stopsBefore)
 {
     const std::lock_guard lock(mutex);
-    if (stops != stopsBefore) {
-        SDL_FreeWAV(sound.buffer);
+    if (stops != stopsBefore)
         return;
-    }
-    setSound(sound);
     spec = sound.spec;
+    setSound(std::move(sound));
     SDL_PauseAudio(0);
     // Still under the mutex: what is asked for after the next stop is not answered by this start.
     requests.answer(device);
@@ -233,12 +192,12 @@ void Audio::playAudio(QIODevice* sound)
     const QString fileName = file->fileName();
     // Outside the locks: a slow card must not hold up whoever pauses or stops meanwhile.
     const unsigned int stopsBefore = d->stops;
-    const LoadedSound loaded = loadedSound(fileName);
-    if (loaded.buffer == nullptr)
+    LoadedSound loaded = LoadedSound::fromFile(fileName);
+    if (loaded.samples == nullptr)
         warn(unloadableSoundLine,
              QStringLiteral("Unable to open sound file %1").arg(Utilities::Debug::literal(fileName)));
     else
-        d->startSound(loaded, sound, stopsBefore);
+        d->startSound(std::move(loaded), sound, stopsBefore);
 }
 
 void Audio::pause()
