@@ -174,6 +174,7 @@ private slots:
     void aDeviceIsReadUntilItIsEmpty_data();
     void aDeviceIsReadUntilItIsEmpty();
     void aFloodedLineDoesNotHoldTheThread();
+    void aFloodThatBeginsAfterTheLookDoesNotHoldTheThread();
 
 private:
     std::unique_ptr<LogCapture> log;
@@ -584,6 +585,30 @@ void SerialProtocolTest::aFloodedLineDoesNotHoldTheThread()
     protocol.processData();
     QCOMPARE(spy.count(), 4);
     QCOMPARE(device.bytes.size(), 0);
+}
+
+/// The device says that nothing is there, and then it never ends.
+void SerialProtocolTest::aFloodThatBeginsAfterTheLookDoesNotHoldTheThread()
+{
+    PieceDevice device;
+    device.tellsItsSize = false;
+    SerialProtocol protocol(device);
+    const QByteArray frame = frameOf(QByteArray(22, 'x'));
+    constexpr qsizetype longest = 10'000;
+    qsizetype received = 0;
+    connect(&protocol, &SerialProtocol::messageReceived, this, [&] {
+        if (++received == longest) // or the test would not end
+            device.refill.clear();
+    });
+    device.longestPiece = frame.size();
+    device.bytes = frame;
+    device.refill = frame;
+    protocol.processData();
+    QVERIFY(received > 0);
+    QVERIFY(received < longest);
+    const auto first = received;
+    protocol.processData();
+    QVERIFY(received > first);
 }
 
 QTEST_GUILESS_MAIN(SerialProtocolTest)

@@ -22,6 +22,7 @@ namespace
 const QString resetFileName = QStringLiteral("/sys/class/misc/msp430/reset");
 constexpr char resetCommand = '1';
 constexpr qsizetype chunkSize = 4096;
+constexpr qint64 shareOfUnknownSize = 16 * chunkSize;
 
 using Outcome = FrameParser::Outcome;
 
@@ -133,11 +134,13 @@ bool SerialProtocol::sendMessage(const QByteArray& payload)
 }
 
 /// Takes what is there now and no more: what comes meanwhile has an announcement of its own, and a line that is flooded
-/// must not keep the thread from its other events.
+/// must not keep the thread from its other events. Nothing there is what a device says, too, that knows no size, and
+/// one whose first bytes come just now: of these a fair share is taken.
 void SerialProtocol::processData()
 {
     std::array<char, chunkSize> chunk; // NOLINT(cppcoreguidelines-pro-type-member-init): written by read
     const auto announced = data->device.bytesAvailable();
+    const auto limit = announced > 0 ? announced : shareOfUnknownSize;
     qint64 done = 0;
     qint64 count = 0;
     do {
@@ -145,7 +148,7 @@ void SerialProtocol::processData()
         if (count > 0)
             parse({chunk.data(), static_cast<qsizetype>(count)});
         done += count;
-    } while (count > 0 && (announced == 0 || done < announced));
+    } while (count > 0 && done < limit);
 }
 
 void SerialProtocol::parse(QByteArrayView bytes)
