@@ -48,12 +48,12 @@ std::optional<QByteArrayView> takenChunk(QByteArrayView& chunks)
 {
     if (chunks.size() < chunkHeaderSize)
         return std::nullopt;
-    const qsizetype length = qFromLittleEndian<quint32>(chunks.data() + 4);
+    const auto length = qFromLittleEndian<quint32>(chunks.data() + 4);
     chunks = chunks.sliced(chunkHeaderSize);
-    if (length > chunks.size())
+    if (length > static_cast<quint64>(chunks.size()))
         return std::nullopt;
-    const auto content = chunks.first(length);
-    chunks = chunks.sliced(length);
+    const auto content = chunks.first(static_cast<qsizetype>(length));
+    chunks = chunks.sliced(content.size());
     return content;
 }
 
