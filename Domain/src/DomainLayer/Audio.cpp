@@ -18,7 +18,11 @@
 
 #include <algorithm>
 #include <atomic>
+#include <chrono>
+#include <future>
 #include <mutex>
+#include <system_error>
+#include <thread>
 #include <utility>
 
 namespace Domain
@@ -41,6 +45,9 @@ constexpr int minimumVolume = 0;
 constexpr int maximumVolume = 6;
 constexpr int defaultVolume = 3;
 constexpr int mixerLevelsPerStep = 10;
+
+/// A healthy device plays what it has been given, three buffers at most.
+constexpr std::chrono::seconds longestClose{1};
 
 constexpr int sampleRate = 16000;
 constexpr Uint16 samplesPerBuffer = 4096;
@@ -70,6 +77,22 @@ void writeMixerLevel(snd_hctl_t* control, int level)
     snd_hctl_elem_write(volume, value);
 }
 
+/// SDL waits for its own thread, without a limit, and that waits for the device to take samples. Returns false when the
+/// device has not been closed in time: then a thread that nobody waits for goes on closing it, and keeps what the
+/// callback might still use.
+bool closeDevice(const std::shared_ptr<AudioFeed>& feed)
+{
+    std::packaged_task<void()> close([feed] { SDL_CloseAudio(); });
+    const auto closed = close.get_future();
+    try {
+        std::thread(std::move(close)).detach();
+    } catch (const std::system_error&) { // the machine has no thread left
+        SDL_CloseAudio();
+        return true;
+    }
+    return closed.wait_for(longestClose) == std::future_status::ready;
+}
+
 } // namespace
 
 class Audio::PrivateData
@@ -86,7 +109,7 @@ public:
     bool initialised = false;
     SDL_AudioSpec spec{};
     LoadedSound::Samples soundBuffer;
-    AudioFeed feed;
+    const std::shared_ptr<AudioFeed> feed = std::make_shared<AudioFeed>();
     /// Held by all who change the sound, outside the callback lock, which guards nothing while no device is open.
     std::mutex mutex;
     /// How often the sound has been stopped; raised under the mutex.
@@ -108,7 +131,7 @@ void Audio::PrivateData::openDevice()
     spec.channels = 1;
     spec.samples = samplesPerBuffer;
     spec.callback = audioFeed;
-    spec.userdata = &feed;
+    spec.userdata = feed.get();
     if (SDL_OpenAudio(&spec, nullptr) < 0)
         warn(openFailedLine, QStringLiteral("Unable to open audio"));
 }
@@ -134,7 +157,7 @@ void Audio::PrivateData::setSound(LoadedSound sound)
     // The previous one goes with the argument, outside the lock.
     const CallbackLock lock;
     soundBuffer.swap(sound.samples);
-    feed = {sound.length, soundBuffer.get()};
+    *feed = {sound.length, soundBuffer.get()};
 }
 
 /// Unless it has been stopped while it was being loaded.
@@ -166,8 +189,7 @@ Audio::~Audio()
     d->thread.quit();
     d->thread.wait();
     Audio::stop();
-    SDL_CloseAudio();
-    if (d->initialised)
+    if (closeDevice(d->feed) && d->initialised)
         SDL_Quit();
 }
 
