@@ -173,6 +173,7 @@ private slots:
         time += 1ms;
         QTRY_VERIFY(!flag("audio.playing"));
         QCOMPARE(number("audio.gap_ms"), 501);
+        QCOMPARE(number("audio.late_ms"), 501);
         time += 1s;
         QTRY_COMPARE(number("audio.gap_ms"), 1501);
         QVERIFY(program.write(played().mid(bufferSize, bufferSize)));
@@ -190,6 +191,27 @@ private slots:
         QVERIFY(program.write(silence + played()));
         QTRY_COMPARE(number("audio.sounds"), 2);
         QCOMPARE(number("audio.gap_ms"), 24 + 1000 + 256);
+    }
+
+    /// Each buffer comes too soon after the last one to be a gap, and the sound has a hole before each.
+    void aStreamThatStuttersIsLate()
+    {
+        const Writer program(stream());
+        time += 1h; // before the first sound: nobody waits
+        QVERIFY(program.write(silence + played().first(bufferSize)));
+        QTRY_COMPARE(number("audio.buffers"), 2);
+        QCOMPARE(number("audio.late_ms"), 0);
+        int heard = 1;
+        for (const auto late : {400ms, 300ms}) {
+            time += 256ms + late;
+            QVERIFY(program.write(played().mid(heard * bufferSize, bufferSize)));
+            ++heard;
+            QTRY_COMPARE(number("audio.buffers"), 1 + heard);
+            QCOMPARE(number("audio.late_ms"), 400);
+        }
+        QCOMPARE(number("audio.gap_ms"), 0);
+        QVERIFY(!registry->set(QStringLiteral("audio.forget"), true));
+        QCOMPARE(number("audio.late_ms"), 0);
     }
 
     void gapsAndMismatchesCanBeForgotten()

@@ -175,6 +175,7 @@ void AudioWatcher::heard(QByteArrayView buffer)
     if (hasSounded) {
         const auto late = lateness();
         stalled += late > schedulersWhim ? late : 0;
+        extendLateness(late);
     }
     lastArrival = now();
     if (matcher.isBetweenSounds())
@@ -226,6 +227,14 @@ void AudioWatcher::extendGap(qint64 milliseconds)
     registry.publish(QStringLiteral("audio.gap_ms"), longestGap);
 }
 
+void AudioWatcher::extendLateness(qint64 milliseconds)
+{
+    if (milliseconds <= greatestLateness)
+        return;
+    greatestLateness = milliseconds;
+    registry.publish(QStringLiteral("audio.late_ms"), greatestLateness);
+}
+
 /// Makes a gap visible while it lasts: nobody knows whether the stream will ever go on.
 void AudioWatcher::checkStall()
 {
@@ -233,6 +242,7 @@ void AudioWatcher::checkStall()
     if (late <= schedulersWhim)
         return;
     registry.publish(QStringLiteral("audio.playing"), false);
+    extendLateness(late);
     extendGap(silentBytes / SoundMatcher::bytesPerMillisecond + stalled + late);
 }
 
@@ -249,7 +259,9 @@ void AudioWatcher::readMixer()
 void AudioWatcher::forget()
 {
     longestGap = 0;
+    greatestLateness = 0;
     registry.publish(QStringLiteral("audio.gap_ms"), 0);
+    registry.publish(QStringLiteral("audio.late_ms"), 0);
     registry.publish(QStringLiteral("audio.mismatches"), 0);
     registry.publish(QStringLiteral("audio.forget"), false);
 }

@@ -32,8 +32,9 @@ struct SandboxPlan;
 /// rows of the control table.
 ///
 /// `audio.gap_ms` counts from the first sound of a program on: silent bytes at 32 a millisecond, and, where the stream
-/// itself falls silent for longer than a scheduler's whim, the time without it. Lives in the thread that makes it,
-/// which must run an event loop.
+/// itself falls silent for longer than a scheduler's whim, the time without it. `audio.late_ms` is the most that a
+/// buffer has been late in the same time, whims included: a stream that stutters shows there. Lives in
+/// the thread that makes it, which must run an event loop.
 class AudioWatcher : public QObject
 {
     Q_OBJECT
@@ -71,6 +72,7 @@ private:
     void judge(const SoundMatcher::Judgement& judgement);
     void extendGap(qint64 milliseconds);
     void publishGap();
+    void extendLateness(qint64 milliseconds);
     void checkStall();
     void readMixer();
     void forget();
@@ -85,9 +87,10 @@ private:
     QByteArray partial; ///< of a buffer
     SoundMatcher matcher;
     bool hasSounded = false;
-    qint64 silentBytes = 0; ///< since the last sound
-    qint64 stalled = 0;     ///< ms without a stream since the last sound
-    qint64 longestGap = 0;  ///< ms
+    qint64 silentBytes = 0;      ///< since the last sound
+    qint64 stalled = 0;          ///< ms without a stream since the last sound
+    qint64 longestGap = 0;       ///< ms
+    qint64 greatestLateness = 0; ///< ms
     Clock::time_point lastArrival;
     QTimer stallTimer;
     QFileSystemWatcher mixerWatcher;
