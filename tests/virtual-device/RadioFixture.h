@@ -145,6 +145,33 @@ protected:
         return tty->everything().chopped(mark.size());
     }
 
+    /// The numbers of the first 20 of a row of numbered packets that come in at a new radio through a line with the
+    /// fault.
+    QStringList arrivedThrough(const QString& fault, int seed)
+    {
+        tearDown();
+        setUp();
+        constexpr qsizetype wanted = 20;
+        QStringList arrived;
+        const auto seen =
+            QObject::connect(registry.get(), &Registry::changed, [&](const QString& name, const QJsonValue& value) {
+                if (name == u"radio.last_command")
+                    arrived.append(value.toString().right(4));
+            });
+        const QString rate = QStringLiteral("radio.to_radio.") + fault;
+        set("radio.ack", "off");
+        set("radio.line_seed", seed);
+        (void)registry->set(rate, 2'000);
+        for (int number = 0; arrived.size() < wanted && number < 1000; ++number) {
+            const auto digits = QByteArray::number(0x1000 + number, 16);
+            (void)tty->write(radioFrame(bytes("02 000001 02 00 01020304") + QByteArray::fromHex(digits)));
+            QCoreApplication::processEvents();
+        }
+        (void)QTest::qWaitFor([&] { return arrived.size() >= wanted; });
+        QObject::disconnect(seen);
+        return arrived.first(std::min(arrived.size(), wanted));
+    }
+
     void setUp()
     {
         registry = std::make_unique<Registry>();

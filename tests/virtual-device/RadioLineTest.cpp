@@ -75,6 +75,56 @@ private slots:
         QCOMPARE(heardThrough(fault, 9), first);
     }
 
+    void damageToTheRadioIsRepeatable_data() { damageToTheProgramIsRepeatable_data(); }
+
+    void damageToTheRadioIsRepeatable()
+    {
+        QFETCH(QString, fault);
+        const QStringList first = arrivedThrough(fault, 9);
+        QCOMPARE(first.size(), 20);
+        QVERIFY(first.back() != "1013"); // not all of them came
+        QVERIFY(arrivedThrough(fault, 10) != first);
+        QCOMPARE(arrivedThrough(fault, 9), first);
+    }
+
+    void eachFaultDoesWhatItsNameSays_data()
+    {
+        QTest::addColumn<QString>("prefix");
+        QTest::addColumn<QString>("fault");
+        QTest::addColumn<int>("longer");
+        QTest::addColumn<bool>("foreign");
+        for (const char* prefix : {"radio.to_program", "radio.to_radio"}) {
+            const auto row = [prefix](const char* fault, int longer, bool foreign) {
+                QTest::addRow("%s.%s", prefix, fault)
+                    << QString::fromLatin1(prefix) << QString::fromLatin1(fault) << longer << foreign;
+            };
+            row("drop", -1, false);
+            row("insert", 1, true);
+            row("flip", 0, true);
+            row("duplicate", 1, false);
+        }
+    }
+
+    void eachFaultDoesWhatItsNameSays()
+    {
+        QFETCH(QString, prefix);
+        QFETCH(QString, fault);
+        QFETCH(int, longer);
+        QFETCH(bool, foreign);
+        const QByteArray sent(500, 'A');
+        (void)registry->set(prefix + '.' + fault, 20'000);
+        LineDirection direction(*registry, prefix, 0);
+        const QSignalSpy spy(&direction, &LineDirection::delivered);
+        direction.send(sent);
+        (void)registry->set(prefix + '.' + fault, 0);
+        direction.send("end");
+        QByteArray heard;
+        QTRY_VERIFY((heard = joined(spy), heard.endsWith("end")));
+        heard.chop(3);
+        QCOMPARE((heard.size() > sent.size()) - (heard.size() < sent.size()), longer);
+        QCOMPARE(heard.count('A') < heard.size(), foreign);
+    }
+
     void damageToTheRadioIsCountedAndNoViolationOfTheProgram()
     {
         set("radio.to_radio.flip", 100'000);
@@ -104,10 +154,18 @@ private slots:
         QCOMPARE(number("radio.to_program.burst"), 0);
     }
 
+    void splitDeliveriesComeInSmallPiecesAndWhole_data()
+    {
+        QTest::addColumn<QString>("prefix");
+        for (const char* prefix : {"radio.to_program", "radio.to_radio"})
+            QTest::addRow("%s", prefix) << QString::fromLatin1(prefix);
+    }
+
     void splitDeliveriesComeInSmallPiecesAndWhole()
     {
-        set("radio.to_program.delivery", "split");
-        LineDirection direction(*registry, QStringLiteral("radio.to_program"), 0);
+        QFETCH(QString, prefix);
+        (void)registry->set(prefix + QStringLiteral(".delivery"), QStringLiteral("split"));
+        LineDirection direction(*registry, prefix, 0);
         const QSignalSpy spy(&direction, &LineDirection::delivered);
         direction.send("twenty-two bytes long.");
         QByteArray whole;
@@ -126,6 +184,20 @@ private slots:
         QCOMPARE(number("radio.bytes_lost"), 0);
         direction.send("too much");
         QCOMPARE(number("radio.bytes_lost"), 8);
+    }
+
+    void mergedBytesComeAtOnce_data() { splitDeliveriesComeInSmallPiecesAndWhole_data(); }
+
+    /// They take half a second, in which the line would give them away a hundred times.
+    void mergedBytesComeAtOnce()
+    {
+        QFETCH(QString, prefix);
+        (void)registry->set(prefix + QStringLiteral(".delivery"), QStringLiteral("merge"));
+        LineDirection direction(*registry, prefix, 0);
+        const QSignalSpy spy(&direction, &LineDirection::delivered);
+        direction.send(QByteArray(5000, 'x'));
+        QTRY_COMPARE(spy.size(), 1);
+        QCOMPARE(joined(spy).size(), 5000);
     }
 
     void mergedDeliveriesComeTogether()
@@ -219,6 +291,7 @@ private slots:
         QTRY_COMPARE(tty->messages(), Messages{"ff00"});
         set("radio.ack", "off");
         command("7e");
+        QTRY_COMPARE(number("radio.commands"), 3);                            // the monitor's patience has begun
         QTest::qWait(static_cast<int>(RadioMonitor::patience.count()) + 100); // then the program may have given up
         command("7e");
         QTRY_COMPARE(number("radio.commands"), 4);
