@@ -104,9 +104,9 @@ void report(benchmark::State& state, const QByteArray& stream, qint64 frames)
     state.counters["frames"] = static_cast<double>(frames) / static_cast<double>(state.iterations());
 }
 
-void parserAlone(benchmark::State& state, Content content, qsizetype size, qsizetype read)
+void parserAlone(benchmark::State& state, const Content& content, qsizetype size, qsizetype read)
 {
-    const QByteArray stream = Benchmarks::makeStream(content, size);
+    const QByteArray stream = content.stream(size);
     FrameParser parser;
     qint64 frames = 0;
     for ([[maybe_unused]] auto iteration : state) {
@@ -120,9 +120,9 @@ void parserAlone(benchmark::State& state, Content content, qsizetype size, qsize
     report(state, stream, frames);
 }
 
-void wholeLink(benchmark::State& state, Content content, qsizetype size, qsizetype read)
+void wholeLink(benchmark::State& state, const Content& content, qsizetype size, qsizetype read)
 {
-    const QByteArray stream = Benchmarks::makeStream(content, size);
+    const QByteArray stream = content.stream(size);
     PieceDevice device(stream, read);
     Domain::SerialProtocol protocol(device);
     qint64 frames = 0;
@@ -135,26 +135,20 @@ void wholeLink(benchmark::State& state, Content content, qsizetype size, qsizety
     report(state, stream, frames);
 }
 
-void addRow(const char* kind, void (*run)(benchmark::State&, Content, qsizetype, qsizetype), Content content,
-            qsizetype size, qsizetype read)
+void addRows(const Content& content, qsizetype size, qsizetype read)
 {
-    const auto name = std::string(kind) + ", " + Benchmarks::nameOf(content) + ", reads of " + std::to_string(read);
-    benchmark::RegisterBenchmark(name.c_str(), run, content, size, read);
+    const auto name = std::string(content.name) + ", reads of " + std::to_string(read);
+    benchmark::RegisterBenchmark(("parser, " + name).c_str(), parserAlone, content, size, read);
+    benchmark::RegisterBenchmark(("link, " + name).c_str(), wholeLink, content, size, read);
 }
 
 void addRows(qsizetype size)
 {
-    for (const auto content : Benchmarks::allContents) {
-        for (const auto read : {chunk, page})
-            addRow("parser", parserAlone, content, size, read);
-        addRow("link", wholeLink, content, size, chunk);
-        addRow("link", wholeLink, content, size, page);
-    }
-    if (size < megabytes8)
-        return;
-    for (const auto content : {Content::PayloadsMixed, Content::Random, Content::StartBytes}) {
-        addRow("parser", parserAlone, content, size, size);
-        addRow("link", wholeLink, content, size, size);
+    for (const auto& content : Benchmarks::allContents()) {
+        addRows(content, size, chunk);
+        addRows(content, size, page);
+        if (content.isReadAtOnceToo && size >= megabytes8)
+            addRows(content, size, size);
     }
 }
 

@@ -14,13 +14,9 @@ namespace
 using TestSupport::frameOf;
 using TestSupport::Generator;
 
-QByteArray repeated(const QByteArray& piece, qsizetype size)
+template <int shortest, int longest> QByteArray frames(qsizetype size)
 {
-    return piece.repeated(size / piece.size() + 1);
-}
-
-QByteArray framesOf(Generator& generator, int shortest, int longest, qsizetype size)
-{
+    Generator generator(1);
     QByteArray stream;
     while (stream.size() < size)
         stream +=
@@ -28,9 +24,11 @@ QByteArray framesOf(Generator& generator, int shortest, int longest, qsizetype s
     return stream;
 }
 
-QByteArray onePercentAltered(Generator& generator, QByteArray stream)
+template <int shortest, int longest> QByteArray onePercentAltered(qsizetype size)
 {
+    Generator generator(2);
     std::bernoulli_distribution altered(0.01);
+    QByteArray stream = frames<shortest, longest>(size);
     for (char& byte : stream) {
         if (altered(generator))
             byte = static_cast<char>(generator());
@@ -38,62 +36,46 @@ QByteArray onePercentAltered(Generator& generator, QByteArray stream)
     return stream;
 }
 
-} // namespace
-
-QByteArray makeStream(Content content, qsizetype size)
+template <char value> QByteArray all(qsizetype size)
 {
-    Generator generator(1);
-    switch (content) {
-    case Content::Payloads1:
-        return framesOf(generator, 1, 1, size);
-    case Content::Payloads10:
-        return framesOf(generator, 10, 10, size);
-    case Content::Payloads46:
-        return framesOf(generator, 46, 46, size);
-    case Content::Payloads100:
-        return framesOf(generator, 100, 100, size);
-    case Content::PayloadsMixed:
-        return framesOf(generator, 1, 100, size);
-    case Content::PayloadsMixedAltered:
-        return onePercentAltered(generator, framesOf(generator, 1, 100, size));
-    case Content::Zeros:
-        return QByteArray(size, '\0');
-    case Content::Random:
-        return TestSupport::randomBytes(generator, static_cast<int>(size));
-    case Content::StartBytes:
-        return QByteArray(size, '|');
-    case Content::WrongDataChecksums:
-        break;
-    }
-    // Headers side by side, each of which claims the hundred bytes behind it.
-    return repeated(frameOf({}, 100, 1).first(7), size);
+    return QByteArray(size, value);
 }
 
-const char* nameOf(Content content)
+QByteArray randomStream(qsizetype size)
 {
-    switch (content) {
-    case Content::Payloads1:
-        return "payloads of 1";
-    case Content::Payloads10:
-        return "payloads of 10";
-    case Content::Payloads46:
-        return "payloads of 46";
-    case Content::Payloads100:
-        return "payloads of 100";
-    case Content::PayloadsMixed:
-        return "payloads of 1..100";
-    case Content::PayloadsMixedAltered:
-        return "payloads of 1..100, 1 % altered";
-    case Content::Zeros:
-        return "all zero";
-    case Content::Random:
-        return "random";
-    case Content::StartBytes:
-        return "all start bytes";
-    case Content::WrongDataChecksums:
-        break;
-    }
-    return "headers with wrong data sums";
+    Generator generator(1);
+    return TestSupport::randomBytes(generator, static_cast<int>(size));
+}
+
+/// Headers side by side, each of which claims the hundred bytes behind it.
+QByteArray headersWithWrongDataSums(qsizetype size)
+{
+    const QByteArray header = frameOf({}, 100, 1).first(7);
+    return header.repeated(size / header.size() + 1);
+}
+
+constexpr Content contents[] = {
+    {"payloads of 1", false, frames<1, 1>},
+    {"payloads of 10", false, frames<10, 10>},
+    {"payloads of 46", false, frames<46, 46>},
+    {"payloads of 100", false, frames<100, 100>},
+    {"payloads of 1..100", true, frames<1, 100>},
+    {"payloads of 1, 1 % altered", false, onePercentAltered<1, 1>},
+    {"payloads of 10, 1 % altered", false, onePercentAltered<10, 10>},
+    {"payloads of 46, 1 % altered", false, onePercentAltered<46, 46>},
+    {"payloads of 100, 1 % altered", false, onePercentAltered<100, 100>},
+    {"payloads of 1..100, 1 % altered", false, onePercentAltered<1, 100>},
+    {"all zero", false, all<'\0'>},
+    {"random", true, randomStream},
+    {"all start bytes", true, all<'|'>},
+    {"headers with wrong data sums", false, headersWithWrongDataSums},
+};
+
+} // namespace
+
+std::span<const Content> allContents()
+{
+    return contents;
 }
 
 } // namespace Benchmarks
