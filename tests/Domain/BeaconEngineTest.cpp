@@ -226,7 +226,7 @@ void BeaconEngineTest::commandsOfManyThreadsAllArriveInEachThreadsOrder()
     for (const auto& command : radio.peer.commands()) {
         constexpr qsizetype addressOffset = 3;
         constexpr qsizetype argumentOffset = 5;
-        const auto thread = static_cast<std::size_t>(command.at(addressOffset));
+        const auto thread = static_cast<std::size_t>(static_cast<uchar>(command.at(addressOffset)));
         QCOMPARE(int(command.at(argumentOffset)), next.at(thread)++);
     }
     QVERIFY(radio.becomesIdle());

@@ -10,7 +10,6 @@
 #include <memory>
 
 using Domain::DspPort;
-using TestSupport::sourcedTexts;
 namespace InstantDsp = TestSupport::InstantDsp;
 
 namespace

@@ -9,7 +9,6 @@ extern "C" {
 #include <pool.h>
 }
 
-using Domain::DspPort;
 using TestSupport::ackType;
 using TestSupport::dataType;
 using TestSupport::DspPeer;

@@ -20,7 +20,6 @@ extern "C" {
 #include <pool.h>
 }
 
-using Domain::DspPort;
 using TestSupport::dataType;
 using TestSupport::DspPeer;
 using TestSupport::openTexts;

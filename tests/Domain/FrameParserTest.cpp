@@ -279,11 +279,12 @@ void FrameParserTest::theSumOfTheFirstBytesLeavesOutThoseBehind()
 {
     QFETCH(const QByteArray, bytes);
     quint16 expected = 0;
-    for (quint16 length = 0; length <= bytes.size(); ++length) {
+    const auto size = static_cast<quint16>(bytes.size());
+    for (quint16 length = 0; length <= size; ++length) {
         QCOMPARE(Domain::FrameChecksum::ofFirst(length, bytes.constData()), expected);
         QCOMPARE(Domain::FrameChecksum::ofFirstInLanes(length, bytes.constData()), expected);
         QCOMPARE(Domain::Frame::checksumOf(bytes.first(length)), expected);
-        if (length < bytes.size())
+        if (length < size)
             expected = static_cast<quint16>(expected + static_cast<uchar>(bytes.at(length)));
     }
 }

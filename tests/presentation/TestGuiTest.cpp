@@ -23,7 +23,6 @@
 using Presentation::TestGui;
 using TestSupport::child;
 using TestSupport::green;
-using TestSupport::red;
 using TestSupport::writeFile;
 
 namespace
