@@ -11,6 +11,7 @@
 #include <QKeyEvent>
 #include <QLabel>
 #include <QMetaMethod>
+#include <QSignalSpy>
 #include <QSpinBox>
 #include <QTest>
 

@@ -4,6 +4,7 @@
 #include "tests/support/Repetition.h"
 
 #include <QFile>
+#include <QLibraryInfo>
 #include <QTest>
 #include <QtEndian>
 

@@ -12,7 +12,6 @@
 #include <unistd.h>
 
 #include <array>
-#include <cstring>
 
 namespace TestSupport
 {
@@ -59,7 +58,7 @@ DspPeer::DspPeer()
     listener = ::socket(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC, 0);
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
-    std::strcpy(address.sun_path, devicePath);
+    qstrncpy(address.sun_path, devicePath, sizeof address.sun_path);
     if (::bind(listener, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 ||
         ::listen(listener, 4) != 0 || ::pipe(wakeUp) != 0)
         qFatal("No private /dev/dsplink: run the test through tests/sandbox.sh");

@@ -15,7 +15,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cstring>
 
 namespace TestSupport
 {
@@ -49,7 +48,7 @@ LogCapture::LogCapture()
     socket = ::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0);
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
-    std::strcpy(address.sun_path, logPath);
+    qstrncpy(address.sun_path, logPath, sizeof address.sun_path);
     if (::bind(socket, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 || ::pipe(wakeUp) != 0)
         qFatal("No private /dev/log: run the test through tests/sandbox.sh");
     thread = std::thread([this] { receive(); });

@@ -18,7 +18,6 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstring>
 #include <thread>
 
 using TestSupport::LogCapture;
@@ -264,7 +263,7 @@ void DebugTest::aServiceThatTakesNothingHoldsNobodyUp()
     const int stuck = ::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0);
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
-    std::strcpy(address.sun_path, "/dev/log");
+    qstrncpy(address.sun_path, "/dev/log", sizeof address.sun_path);
     QCOMPARE(::bind(stuck, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
     Debug::open();
 

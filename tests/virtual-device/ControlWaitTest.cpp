@@ -7,6 +7,7 @@
 #include <QElapsedTimer>
 #include <QJsonArray>
 #include <QTest>
+#include <QTimer>
 
 #include <memory>
 #include <thread>

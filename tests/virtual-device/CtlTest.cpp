@@ -13,6 +13,7 @@
 #include <QLocalServer>
 #include <QProcess>
 #include <QTest>
+#include <QTimer>
 
 #include <memory>
 

@@ -8,6 +8,7 @@
 
 #include <QFile>
 #include <QTest>
+#include <QtEndian>
 
 #include <sys/socket.h>
 #include <sys/un.h>

@@ -13,8 +13,6 @@
 #include <sys/un.h>
 #include <unistd.h>
 
-#include <cstring>
-
 using VirtualDevice::LogLine;
 using VirtualDevice::LogStore;
 
@@ -29,7 +27,7 @@ public:
     {
         sockaddr_un address{};
         address.sun_family = AF_UNIX;
-        std::strcpy(address.sun_path, qPrintable(path));
+        qstrncpy(address.sun_path, qPrintable(path), sizeof address.sun_path);
         isConnected = ::connect(descriptor, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0;
     }
     ~Sender() { ::close(descriptor); }
