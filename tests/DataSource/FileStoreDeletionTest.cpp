@@ -9,10 +9,13 @@
 #include <QThread>
 #include <QThreadPool>
 
+#include <dirent.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <mutex>
+#include <thread>
 
 using DataSource::AbstractFileStore;
 using DataSource::FileStore;
@@ -38,7 +41,57 @@ QList<int> percentages(const QSignalSpy& spy)
     return values;
 }
 
+/// A function that the store's task calls again and again, of which one call may be held up.
+class HeldCall
+{
+public:
+    void holdUp(int call)
+    {
+        calls = 0;
+        heldUp = call;
+    }
+    void release() { heldUp = none; }
+    [[nodiscard]] bool isWaiting() const { return waiting; }
+    [[nodiscard]] int count() const { return calls; }
+
+    void called()
+    {
+        if (std::this_thread::get_id() == testThread)
+            return;
+        const int call = ++calls;
+        waiting = call == heldUp;
+        while (call == heldUp)
+            ::usleep(1000);
+        waiting = false;
+    }
+
+private:
+    static constexpr int none = -1;
+    const std::thread::id testThread = std::this_thread::get_id();
+    std::atomic<int> calls = 0;
+    std::atomic<int> heldUp = none;
+    std::atomic<bool> waiting = false;
+};
+
+HeldCall listingStep;
+HeldCall shrinkStep;
+
 } // namespace
+
+/// Qt's, on this platform.
+extern "C" struct dirent64* readdir64(DIR* stream)
+{
+    static const auto real = reinterpret_cast<struct dirent64* (*)(DIR*)>(TestSupport::nextSymbol("readdir64"));
+    listingStep.called();
+    return real(stream);
+}
+
+extern "C" int ftruncate(int file, off_t length) noexcept
+{
+    static const auto real = reinterpret_cast<int (*)(int, off_t)>(TestSupport::nextSymbol("ftruncate"));
+    shrinkStep.called();
+    return real(file, length);
+}
 
 /// Nothing but the chosen entry of the store's directory may ever change.
 class FileStoreDeletionTest : public FileStoreFixture
@@ -68,6 +121,8 @@ private slots:
     void directoryThatVanishedMeanwhile();
     void readOnlyFileIsRemoved();
     void readOnlyDirectoryKeepsTheEntry();
+    void destructionInTheMiddleOfAScanStopsIt();
+    void destructionInTheMiddleOfADeletionLetsItEndUnheard();
     void destructionDuringAScan();
     void destructionDuringADeletion();
     void destructionBeforeTheTaskStarts();
@@ -373,6 +428,42 @@ void FileStoreDeletionTest::readOnlyDirectoryKeepsTheEntry()
     remove(store, "file");
     QVERIFY(QFile::exists(path("file")));
     QVERIFY(QFile::setPermissions(directory(), QFile::ReadOwner | QFile::WriteOwner | QFile::ExeOwner));
+}
+
+void FileStoreDeletionTest::destructionInTheMiddleOfAScanStopsIt()
+{
+    constexpr int files = 3000;
+    makeFiles(files, 1);
+    auto store = std::make_unique<FileStore>(directory());
+    listingStep.holdUp(files / 2);
+    store->rescan();
+    QTRY_VERIFY(listingStep.isWaiting());
+    store.reset();
+    QVERIFY(listingStep.isWaiting());
+    listingStep.release();
+    settle();
+    QVERIFY(listingStep.count() < files);
+    QCOMPARE(listing().size(), files);
+}
+
+void FileStoreDeletionTest::destructionInTheMiddleOfADeletionLetsItEndUnheard()
+{
+    makeFile("large", 1000 * mebibyte); // a hundred steps
+    auto store = std::make_unique<FileStore>(directory());
+    std::atomic<int> reports = 0;
+    connect(
+        store.get(), &AbstractFileStore::deleteProgress, store.get(), [&](qint32) { ++reports; }, Qt::DirectConnection);
+    shrinkStep.holdUp(50);
+    store->deleteFile(0);
+    QTRY_VERIFY(shrinkStep.isWaiting());
+    QCOMPARE(reports.load(), 49);
+    store.reset();
+    QVERIFY(shrinkStep.isWaiting());
+    shrinkStep.release();
+    settle();
+    QCOMPARE(shrinkStep.count(), 100);
+    QCOMPARE(reports.load(), 49);
+    QVERIFY(!QFile::exists(path("large")));
 }
 
 void FileStoreDeletionTest::destructionDuringAScan()
