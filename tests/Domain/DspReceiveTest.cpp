@@ -12,6 +12,7 @@
 #include <atomic>
 #include <memory>
 #include <mutex>
+#include <vector>
 
 using namespace Domain;
 using TestSupport::DspPeer;
@@ -79,7 +80,7 @@ private:
     std::unique_ptr<Dsp> dsp;
 
     mutable std::mutex mutex;
-    QStringList events; ///< the signals in their order
+    std::vector<QString> events; ///< the signals in their order; not shared with the copies that `seen` gives out
     QVector<WirelessSensorReading> readings;
     PairingUpgradeData packet;
     QThread* emitter = nullptr;
@@ -87,7 +88,7 @@ private:
     void note(const QString& event)
     {
         const std::lock_guard lock(mutex);
-        events.append(event);
+        events.push_back(event);
         emitter = QThread::currentThread();
     }
 
@@ -144,7 +145,7 @@ private:
     QStringList seen() const
     {
         const std::lock_guard lock(mutex);
-        return events;
+        return {events.begin(), events.end()};
     }
 
     /// Sends one message and returns the signals that it caused, the start of reading left out. A second message marks

@@ -37,7 +37,7 @@ void RadioPeer::answerWith(Answer next)
 QList<QByteArray> RadioPeer::commands() const
 {
     const std::lock_guard guard(mutex);
-    return taken;
+    return {taken.begin(), taken.end()};
 }
 
 QByteArray RadioPeer::ack()
@@ -85,7 +85,7 @@ void RadioPeer::take(QByteArray& buffer)
         QByteArray bytes;
         {
             const std::lock_guard guard(mutex);
-            taken.append(command);
+            taken.push_back(command);
             bytes = answer(command);
         }
         line.write(bytes);

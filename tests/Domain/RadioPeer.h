@@ -11,6 +11,7 @@
 #include <functional>
 #include <mutex>
 #include <thread>
+#include <vector>
 
 namespace TestSupport
 {
@@ -45,7 +46,7 @@ private:
     Pty& line;
     int stopPipe[2] = {-1, -1};
     mutable std::mutex mutex;
-    QList<QByteArray> taken;
+    std::vector<QByteArray> taken; ///< not shared with the copies that the test gets
     Answer answer = [](const QByteArray&) { return QByteArray(); };
     std::thread thread;
 };

@@ -6,6 +6,7 @@
 #include <QMutex>
 
 #include <utility>
+#include <vector>
 
 namespace TestSupport
 {
@@ -14,13 +15,19 @@ namespace
 {
 
 QMutex mutex;
-QStringList debugTexts;
-QStringList otherTexts;
+// Any thread adds to them: not shared with the copies that are given out.
+std::vector<QString> debugTexts;
+std::vector<QString> otherTexts;
+
+QStringList listOf(const std::vector<QString>& texts)
+{
+    return {texts.begin(), texts.end()};
+}
 
 void keep(QtMsgType type, const QMessageLogContext& /*context*/, const QString& text)
 {
     const QMutexLocker lock(&mutex);
-    (type == QtDebugMsg ? debugTexts : otherTexts).append(text);
+    (type == QtDebugMsg ? debugTexts : otherTexts).push_back(text);
 }
 
 } // namespace
@@ -40,19 +47,19 @@ DebugOutput::~DebugOutput()
 QStringList DebugOutput::texts() const
 {
     const QMutexLocker lock(&mutex);
-    return debugTexts;
+    return listOf(debugTexts);
 }
 
 QStringList DebugOutput::complaints() const
 {
     const QMutexLocker lock(&mutex);
-    return otherTexts;
+    return listOf(otherTexts);
 }
 
 QStringList DebugOutput::take()
 {
     const QMutexLocker lock(&mutex);
-    return std::exchange(debugTexts, {});
+    return listOf(std::exchange(debugTexts, {}));
 }
 
 int DebugOutput::count(const QString& text) const

@@ -6,6 +6,9 @@
 #include <QMutex>
 #include <QObject>
 
+#include <algorithm>
+#include <vector>
+
 /// Qt's table of callbacks for tools; the entries are numbered in its private header.
 extern quintptr Q_CORE_EXPORT qtHookData[];
 
@@ -19,24 +22,25 @@ constexpr int addObject = 3;
 constexpr int removeObject = 4;
 
 QMutex mutex;
-QList<QObject*> objects;
-QList<QObject*> watched;
-QStringList watchedNames;
-QStringList destroyedNames;
+// Objects come and go in every thread: what is kept is not shared with the copies that are given out.
+std::vector<QObject*> objects;
+std::vector<QObject*> watched;
+std::vector<QString> watchedNames;
+std::vector<QString> destroyedNames;
 
 void added(QObject* object)
 {
     const QMutexLocker lock(&mutex);
-    objects.append(object);
+    objects.push_back(object);
 }
 
 void removed(QObject* object)
 {
     const QMutexLocker lock(&mutex);
-    objects.removeOne(object);
-    const auto index = watched.indexOf(object);
-    if (index >= 0)
-        destroyedNames.append(watchedNames.at(index));
+    if (const auto living = std::find(objects.begin(), objects.end(), object); living != objects.end())
+        objects.erase(living);
+    if (const auto found = std::find(watched.begin(), watched.end(), object); found != watched.end())
+        destroyedNames.push_back(watchedNames.at(static_cast<std::size_t>(found - watched.begin())));
 }
 
 } // namespace
@@ -60,20 +64,20 @@ ObjectRecorder::~ObjectRecorder()
 QList<QObject*> ObjectRecorder::living() const
 {
     const QMutexLocker lock(&mutex);
-    return objects;
+    return {objects.begin(), objects.end()};
 }
 
 void ObjectRecorder::watch(const QList<QObject*>& chosen, const QStringList& names)
 {
     const QMutexLocker lock(&mutex);
-    watched = chosen;
-    watchedNames = names;
+    watched.assign(chosen.begin(), chosen.end());
+    watchedNames.assign(names.begin(), names.end());
 }
 
 QStringList ObjectRecorder::destroyed() const
 {
     const QMutexLocker lock(&mutex);
-    return destroyedNames;
+    return {destroyedNames.begin(), destroyedNames.end()};
 }
 
 } // namespace TestSupport

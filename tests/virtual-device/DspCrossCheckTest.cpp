@@ -18,6 +18,7 @@
 
 #include <atomic>
 #include <mutex>
+#include <vector>
 
 using namespace VirtualDevice;
 
@@ -30,23 +31,23 @@ const QString image = QStringLiteral("/dsp.out");
 struct Heard
 {
     std::mutex mutex;
-    QStringList events;
-    QList<QVector<Domain::WirelessSensorReading>> frames;
+    std::vector<QString> events; ///< not shared with the copies that `all` gives out
+    std::vector<QVector<Domain::WirelessSensorReading>> frames;
 
     void add(const QString& event)
     {
         const std::lock_guard lock(mutex);
-        events.append(event);
+        events.push_back(event);
     }
     [[nodiscard]] QStringList all()
     {
         const std::lock_guard lock(mutex);
-        return events;
+        return {events.begin(), events.end()};
     }
     [[nodiscard]] qsizetype frameCount()
     {
         const std::lock_guard lock(mutex);
-        return frames.size();
+        return static_cast<qsizetype>(frames.size());
     }
 };
 
@@ -101,7 +102,7 @@ class DspCrossCheckTest : public QObject
             dsp.get(), &Dsp::sensorReadingsReceived, dsp.get(),
             [to](const QVector<Domain::WirelessSensorReading>& readings) {
                 const std::lock_guard lock(to->mutex);
-                to->frames.append(readings);
+                to->frames.push_back(readings);
             },
             direct);
     }
