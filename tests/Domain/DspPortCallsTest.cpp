@@ -5,8 +5,12 @@
 #include "tests/Domain/DspTestParts.h"
 #include "tests/support/InstantDsp.h"
 
+#include <QElapsedTimer>
 #include <QTest>
 
+#include <algorithm>
+#include <atomic>
+#include <climits>
 #include <memory>
 
 using Domain::DspPort;
@@ -115,6 +119,64 @@ private slots:
         QStringList expected{"DspLink: DSP execution started successfully.", "DspPort: open complete."};
         expected.insert(afterTheStart ? 1 : 0, "(priority 0) DspPort: " + text + ". Status = 0x80008028");
         QCOMPARE(TestSupport::sourcedTexts(*log, TestSupport::Priorities::Shown), expected);
+    }
+
+    void aRefusedFetchIsRepeatedTwiceASecondAtMost()
+    {
+        InstantDsp::refuse("MSGQ_get");
+        const std::size_t before = InstantDsp::fetches();
+        QElapsedTimer clock;
+        clock.start();
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        QTest::qSleep(1200);
+        const std::size_t fetches = InstantDsp::fetches() - before;
+        QVERIFY(fetches >= 1);
+        constexpr qint64 shortestPause = 450; // ms; a wait may end a little early
+        const auto most = static_cast<std::size_t>(clock.elapsed() / shortestPause + 1);
+        QVERIFY2(fetches <= most, qPrintable(QString::number(fetches)));
+    }
+
+    void closingCutsThePauseAfterARefusedFetch()
+    {
+        InstantDsp::refuse("MSGQ_get");
+        qint64 shortest = LLONG_MAX; // of several: the machine may be busy
+        for (int round = 0; round < 5; ++round) {
+            std::size_t before = InstantDsp::fetches();
+            QVERIFY(port->open(QIODevice::ReadWrite));
+            QTRY_VERIFY(InstantDsp::fetches() > before);
+            before = InstantDsp::fetches();
+            QElapsedTimer clock;
+            clock.start();
+            port->close();
+            shortest = std::min(shortest, clock.elapsed());
+            QVERIFY(InstantDsp::fetches() <= before + 1); // one may have been on its way
+        }
+        QVERIFY2(shortest < 300, qPrintable(QString::number(shortest)));
+    }
+
+    /// The base class finds it out on first use and remembers it: not in two threads at once.
+    void whetherItIsSequentialIsKnownBeforeAnyThreadUsesIt()
+    {
+        struct AskedPort : DspPort
+        {
+            using DspPort::DspPort;
+            bool isSequential() const override
+            {
+                ++asked;
+                return DspPort::isSequential();
+            }
+            mutable std::atomic<int> asked = 0;
+        } askedPort(QStringLiteral("/dsp.out"));
+        for (int round = 0; round < 2; ++round) {
+            QVERIFY(askedPort.open(QIODevice::ReadWrite));
+            QVERIFY(askedPort.asked > round); // opening forgets
+            const int before = askedPort.asked;
+            QCOMPARE(askedPort.write("command!", 8), 8);
+            QTRY_VERIFY(askedPort.bytesAvailable() > 0);
+            QCOMPARE(askedPort.readLine(askedPort.maxBytesAvailable() + 1).size(), 12);
+            QCOMPARE(askedPort.asked.load(), before);
+            askedPort.close();
+        }
     }
 };
 

@@ -9,6 +9,7 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <chrono>
 #include <condition_variable>
 #include <cstdio>
@@ -82,10 +83,17 @@ struct Record
 {
     std::array<std::array<char, longestCall>, callsKept> calls{};
     std::size_t count = 0;
-    const char* refused = "";
+    // The port's own thread asks for messages.
+    std::atomic<std::size_t> fetches = 0;
+    std::atomic<const char*> refused = "";
 };
 
 Record record;
+
+bool isRefused(const char* call)
+{
+    return std::strcmp(call, record.refused) == 0;
+}
 
 const char* presence(const void* pointer)
 {
@@ -103,8 +111,7 @@ DSP_STATUS called(DSP_STATUS result, const char* name, const char* format, Argum
             static_cast<std::size_t>(std::snprintf(text + length, longestCall - length, format, arguments...));
         std::snprintf(text + length + rest, longestCall - length - rest, ")");
     }
-    const bool refused = std::strcmp(name, record.refused) == 0;
-    return refused ? static_cast<DSP_STATUS>(TestSupport::InstantDsp::refusal) : result;
+    return isRefused(name) ? static_cast<DSP_STATUS>(TestSupport::InstantDsp::refusal) : result;
 }
 
 } // namespace
@@ -129,6 +136,11 @@ QStringList TestSupport::InstantDsp::takeCalls()
         all.append(QString::fromLatin1(record.calls[index].data()));
     record.count = 0;
     return all;
+}
+
+std::size_t TestSupport::InstantDsp::fetches()
+{
+    return record.fetches;
 }
 
 void TestSupport::InstantDsp::refuse(const char* call)
@@ -254,6 +266,9 @@ DSP_STATUS MSGQ_put(MSGQ_Queue /*msgqQueue*/, MSGQ_Msg msg)
 
 DSP_STATUS MSGQ_get(MSGQ_Queue /*msgqQueue*/, Uint32 timeout, MSGQ_Msg* msg)
 {
+    ++record.fetches;
+    if (isRefused("MSGQ_get"))
+        return static_cast<DSP_STATUS>(TestSupport::InstantDsp::refusal);
     std::unique_lock lock(link().mutex);
     const auto arrived = [] { return link().waitingCount > 0; };
     if (!link().changed.wait_for(lock, std::chrono::milliseconds(timeout), arrived))

@@ -6,6 +6,7 @@
 #include <QByteArray>
 #include <QStringList>
 
+#include <cstddef>
 #include <cstdint>
 
 /// The whole DSPLink interface in this process, without socket or peer: linked in front of the library, it shows what
@@ -14,7 +15,7 @@
 /// It keeps the calls that open and close the link, with their arguments: "PROC_attach(0, null)"; numbers of 32 bits in
 /// hexadecimal, a pool's attributes as "4: 10 x 2048, ... exact".
 ///
-/// Threads: `deliver` may be called from any, the others from the one that opens and closes.
+/// Threads: `deliver` and `fetches` may be called from any, the others from the one that opens and closes.
 namespace TestSupport::InstantDsp
 {
 
@@ -25,7 +26,11 @@ void deliver(const QByteArray& data, std::uint16_t id = 100);
 /// The calls kept since the last time.
 [[nodiscard]] QStringList takeCalls();
 
-/// From now on the call of this name gives `refusal` and has no effect; no name: none does. The name must last.
+/// How often the program has asked for a message.
+[[nodiscard]] std::size_t fetches();
+
+/// From now on the call of this name, one that is kept or MSGQ_get, gives `refusal` and has no effect; no name: none
+/// does. The name must last.
 void refuse(const char* call = "");
 inline constexpr std::uint32_t refusal = 0x80008028; // out of some resource
 

@@ -172,6 +172,9 @@ bool DspPort::open(OpenMode mode)
         Debug::warningMessage(__FILE__, __LINE__, QStringLiteral("Unable to open DSP port"));
         return false;
     }
+    // The base class finds out on first use that the device is sequential, and remembers it. That must not happen in a
+    // reading and a writing thread at once.
+    (void)QIODevice::bytesAvailable();
     privateData->openLink();
     if ((mode & ReadOnly) != 0 && !privateData->startReading()) {
         Debug::warningMessage(__FILE__, __LINE__, QStringLiteral("Previous read thread is not finished."));
