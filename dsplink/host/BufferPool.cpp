@@ -46,6 +46,11 @@ DSP_STATUS BufferPool::allocate(std::size_t size, std::uint8_t** buffer)
     return DSP_SOK;
 }
 
+bool BufferPool::hasSizeFor(std::size_t size) const
+{
+    return !buffers.empty() && buffers.back().size >= size;
+}
+
 std::uint8_t* BufferPool::allocateAtLeast(std::size_t size)
 {
     const auto found = std::find_if(buffers.begin(), buffers.end(),

@@ -28,6 +28,9 @@ public:
     /// `DSP_EINVALIDARG` for a size that an exact pool does not have, `DSP_EMEMORY` when all of that size are out.
     [[nodiscard]] DSP_STATUS allocate(std::size_t size, std::uint8_t** buffer);
 
+    /// Whether any buffer, free or not, holds so much.
+    [[nodiscard]] bool hasSizeFor(std::size_t size) const;
+
     /// For a message that arrives: the smallest free buffer that holds it; null if there is none.
     [[nodiscard]] std::uint8_t* allocateAtLeast(std::size_t size);
 

@@ -99,8 +99,11 @@ Connection::Connection(int connectedSocket, int wakeUpEvent, ConnectionListener&
 Connection::~Connection()
 {
     close();
-    ::close(wakeUp);
-    ::close(socket);
+}
+
+Connection::Descriptor::~Descriptor()
+{
+    ::close(number);
 }
 
 void Connection::close()
@@ -131,13 +134,18 @@ DSP_STATUS Connection::request(PacketKind kind, ByteView payload, std::uint32_t 
     std::array<std::uint8_t, packetHeaderSize> head{};
     storePacketHeader(head.data(), kind, serial);
     bool taken = false;
-    if (lost || !sendOrQueue(head, payload, nullptr, taken))
+    // A locate may wait without limit: the end of the transport, which would end it, must not have gone by.
+    if (lost || (kind == PacketKind::Locate && !transportOpen) || !sendOrQueue(head, payload, nullptr, taken))
         return DSP_EFAIL;
     pending.emplace(serial, &entry);
     // The thread may have stopped reading for want of room; a reply has to get through.
     wake();
     const DSP_STATUS status = awaitReply(lock, entry, milliseconds);
     pending.erase(serial);
+    // Firmware may be long in making its queue. Any other reply is the driver's own: whoever owes one is dead, although
+    // the connection stands, and nobody shall wait for it again.
+    if (!entry.done && kind != PacketKind::Locate)
+        giveUp();
     if (value != nullptr)
         *value = entry.value;
     return status;
@@ -151,6 +159,13 @@ DSP_STATUS Connection::awaitReply(std::unique_lock<std::mutex>& lock, Pending& e
     else if (!replied.wait_for(lock, std::chrono::milliseconds(milliseconds), answered))
         return DSP_ETIMEOUT;
     return entry.status;
+}
+
+void Connection::giveUp()
+{
+    lost = true;
+    closing = true;
+    wake();
 }
 
 DSP_STATUS Connection::send(std::uint32_t queue, ByteView message)

@@ -57,7 +57,8 @@ public:
     void close();
 
     /// Sends a request and waits for its reply; `milliseconds` may be WAIT_FOREVER. Returns the reply's status,
-    /// `DSP_ETIMEOUT`, or `DSP_EFAIL` when the peer is or gets lost.
+    /// `DSP_ETIMEOUT`, or `DSP_EFAIL` when the peer is or gets lost; for a locate also while the transport is closed.
+    /// A peer that lets the time of anything but a locate pass is lost from then on.
     [[nodiscard]] DSP_STATUS request(PacketKind kind, ByteView payload, std::uint32_t milliseconds,
                                      std::uint32_t* value = nullptr);
 
@@ -87,6 +88,18 @@ private:
         const void* buffer = nullptr; ///< of the pool, when the packet is a message
     };
 
+    /// Closes its descriptor at the end, also of a construction that fails.
+    struct Descriptor
+    {
+        explicit Descriptor(int opened) : number(opened) {}
+        ~Descriptor();
+        Descriptor(const Descriptor&) = delete;
+        Descriptor& operator=(const Descriptor&) = delete;
+        operator int() const { return number; }
+
+        const int number;
+    };
+
     Connection(int socket, int wakeUp, ConnectionListener& listener);
 
     void serve();
@@ -97,11 +110,13 @@ private:
     [[nodiscard]] bool sendQueued();
     [[nodiscard]] bool sendOrQueue(ByteView head, ByteView body, const void* buffer, bool& taken);
     [[nodiscard]] DSP_STATUS awaitReply(std::unique_lock<std::mutex>& lock, Pending& entry, std::uint32_t milliseconds);
+    /// Treats the peer as lost; the mutex is held.
+    void giveUp();
     void lose();
     void wake() const;
 
-    const int socket;
-    const int wakeUp;
+    const Descriptor socket;
+    const Descriptor wakeUp;
     ConnectionListener& listener;
 
     mutable std::mutex mutex;

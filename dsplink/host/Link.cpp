@@ -23,6 +23,8 @@ constexpr std::uint16_t armProcessorId = 1;
 constexpr std::size_t maximumQueues = 16;
 constexpr std::size_t maximumWaitingMessages = 1024;
 constexpr std::uint32_t replyTimeout = 5000;
+/// At the end nobody has five seconds left: the whole program is to be down within three.
+constexpr std::uint32_t closingReplyTimeout = 1000;
 
 bool isReadableFile(const char* path)
 {
@@ -101,7 +103,8 @@ DSP_STATUS Link::ask(PacketKind kind, ByteView payload, Uint32 milliseconds, std
 
 DSP_STATUS Link::advance(PacketKind kind, ByteView payload, Stage reached, DSP_STATUS success)
 {
-    const DSP_STATUS status = ask(kind, payload, replyTimeout);
+    const bool closes = kind == PacketKind::Stop || kind == PacketKind::Detach;
+    const DSP_STATUS status = ask(kind, payload, closes ? closingReplyTimeout : replyTimeout);
     if (DSP_FAILED(status))
         return status;
     {
@@ -238,8 +241,9 @@ DSP_STATUS Link::openQueue(const char* name, MSGQ_Queue* queue)
         return DSP_SOK;
     }
     const std::lock_guard lock(mutex);
-    waitingMessages -= queues[number].messages.size();
+    dropMessages(queues[number]);
     queues.erase(number);
+    giveBuffers();
     return status;
 }
 
@@ -249,16 +253,17 @@ DSP_STATUS Link::closeQueue(MSGQ_Queue queue)
     bool attached = false;
     {
         const std::lock_guard lock(mutex);
-        const LocalQueue* const closing = localQueue(queue);
+        LocalQueue* const closing = localQueue(queue);
         if (closing == nullptr)
             return DSP_EINVALIDARG;
-        waitingMessages -= closing->messages.size();
+        dropMessages(*closing);
         queues.erase(static_cast<std::uint16_t>(queue & 0xFFFFU));
+        giveBuffers();
         attached = stage >= Stage::Attached;
     }
     changed.notify_all();
     // The queue is gone here whatever the DSP's side says to it.
-    return attached ? ask(PacketKind::QueueClose, numberPayload(queue), replyTimeout) : DSP_SOK;
+    return attached ? ask(PacketKind::QueueClose, numberPayload(queue), closingReplyTimeout) : DSP_SOK;
 }
 
 DSP_STATUS Link::checkErrorHandler(MSGQ_Queue queue)
@@ -298,13 +303,12 @@ DSP_STATUS Link::closeTransport()
         stage = Stage::Started;
         acceptsMessages = false;
         for (auto& [number, queue] : queues)
-            queue.messages.clear();
-        waitingMessages = 0;
+            dropMessages(queue);
     }
     changed.notify_all();
     if (const auto peer = currentConnection())
         peer->closeTransport();
-    const DSP_STATUS status = ask(PacketKind::TransportClose, {}, replyTimeout);
+    const DSP_STATUS status = ask(PacketKind::TransportClose, {}, closingReplyTimeout);
     return DSP_FAILED(status) ? status : DSP_SCLOSED;
 }
 
@@ -348,6 +352,7 @@ DSP_STATUS Link::free(MSGQ_Msg message)
         const std::lock_guard lock(mutex);
         if (!pool || !pool->free(message))
             return DSP_EINVALIDARG;
+        giveBuffers();
     }
     changed.notify_all();
     return DSP_SOK;
@@ -376,7 +381,7 @@ DSP_STATUS Link::get(MSGQ_Queue queue, Uint32 milliseconds, MSGQ_Msg* message)
     bool expired = milliseconds == WAIT_NONE;
     while (true) {
         const DSP_STATUS status = tryGet(queue, message);
-        // What time can mend: no message yet, or every buffer out.
+        // What time can mend: no message yet, or none that has found a buffer.
         if (status != DSP_ENOTCOMPLETE && status != DSP_EMEMORY)
             return status;
         if (expired)
@@ -394,27 +399,54 @@ DSP_STATUS Link::tryGet(MSGQ_Queue queue, MSGQ_Msg* message)
     if (from == nullptr)
         return DSP_EINVALIDARG;
     // What had arrived is delivered even when the peer is gone.
-    if (!from->messages.empty())
-        return takeMessage(*from, message);
+    if (!from->messages.empty()) {
+        *message = takeMessage(*from);
+        return DSP_SOK;
+    }
+    if (!from->withoutBuffer.empty())
+        return DSP_EMEMORY;
     return stage == Stage::TransportOpen ? DSP_ENOTCOMPLETE : DSP_EFAIL;
 }
 
-DSP_STATUS Link::takeMessage(LocalQueue& from, MSGQ_Msg* message)
+MSGQ_Msg Link::takeMessage(LocalQueue& from)
 {
-    if (!pool)
-        return DSP_EFAIL;
-    const Bytes& first = from.messages.front();
-    std::uint8_t* const buffer = pool->allocateAtLeast(first.size());
-    if (buffer == nullptr)
-        return DSP_EMEMORY;
-    std::memcpy(buffer, first.data(), first.size());
-    *message = reinterpret_cast<MSGQ_Msg>(buffer);
-    (*message)->size = static_cast<Uint16>(first.size());
+    const MSGQ_Msg message = from.messages.front();
     from.messages.pop_front();
     // What a lost peer has left behind is fetched without a connection.
     if (waitingMessages-- == maximumWaitingMessages && connection)
         connection->resumeReading();
-    return DSP_SOK;
+    return message;
+}
+
+void Link::giveBuffers()
+{
+    for (auto& [number, queue] : queues)
+        giveBuffers(queue);
+}
+
+void Link::giveBuffers(LocalQueue& queue)
+{
+    while (!queue.withoutBuffer.empty()) {
+        const Bytes& first = queue.withoutBuffer.front();
+        std::uint8_t* const buffer = pool->allocateAtLeast(first.size());
+        if (buffer == nullptr)
+            return;
+        std::memcpy(buffer, first.data(), first.size());
+        const auto message = reinterpret_cast<MSGQ_Msg>(buffer);
+        message->size = static_cast<Uint16>(first.size());
+        queue.messages.push_back(message);
+        queue.withoutBuffer.pop_front();
+    }
+}
+
+void Link::dropMessages(LocalQueue& queue)
+{
+    waitingMessages -= queue.messages.size() + queue.withoutBuffer.size();
+    for (const MSGQ_Msg message : queue.messages) {
+        [[maybe_unused]] const bool freed = pool->free(message);
+    }
+    queue.messages.clear();
+    queue.withoutBuffer.clear();
 }
 
 Link::LocalQueue* Link::localQueue(MSGQ_Queue queue)
@@ -428,11 +460,12 @@ void Link::messageArrived(std::uint32_t queue, ByteView message)
     {
         const std::lock_guard lock(mutex);
         LocalQueue* const to = localQueue(queue);
-        const bool wanted = to != nullptr && acceptsMessages;
+        const bool wanted = to != nullptr && acceptsMessages && pool && pool->hasSizeFor(message.size());
         if (!wanted || message.size() < sizeof(MSGQ_MsgHeader) || waitingMessages >= maximumWaitingMessages)
             return;
-        to->messages.emplace_back(message.begin(), message.end());
+        to->withoutBuffer.emplace_back(message.begin(), message.end());
         ++waitingMessages;
+        giveBuffers(*to);
     }
     changed.notify_all();
 }
@@ -441,8 +474,8 @@ void Link::messageSent(const void* buffer)
 {
     {
         const std::lock_guard lock(mutex);
-        if (pool) [[maybe_unused]]
-            const bool freed = pool->free(buffer);
+        if (pool && pool->free(buffer))
+            giveBuffers();
     }
     changed.notify_all();
 }

@@ -68,7 +68,8 @@ private:
     struct LocalQueue
     {
         std::string name;
-        std::deque<Bytes> messages; ///< not yet fetched, header included
+        std::deque<MSGQ_Msg> messages;   ///< not yet fetched
+        std::deque<Bytes> withoutBuffer; ///< after those: what the DSP could send only once the pool has room for it
     };
 
     Link() = default;
@@ -88,7 +89,11 @@ private:
     [[nodiscard]] std::shared_ptr<Connection> currentConnection() const;
     [[nodiscard]] LocalQueue* localQueue(MSGQ_Queue queue);
     [[nodiscard]] std::uint16_t freeQueueNumber() const;
-    [[nodiscard]] DSP_STATUS takeMessage(LocalQueue& from, MSGQ_Msg* message);
+    [[nodiscard]] MSGQ_Msg takeMessage(LocalQueue& from);
+    /// A message in flight holds a buffer of the pool whichever way it goes: gives what is free to those that wait.
+    void giveBuffers();
+    void giveBuffers(LocalQueue& queue);
+    void dropMessages(LocalQueue& queue);
     [[nodiscard]] DSP_STATUS tryGet(MSGQ_Queue queue, MSGQ_Msg* message);
     void setAcceptsMessages(bool accepts);
 
@@ -100,7 +105,7 @@ private:
     bool acceptsMessages = false; ///< from the start of the DSP to the end of the transport
     std::optional<BufferPool> pool;
     std::map<std::uint16_t, LocalQueue> queues;
-    std::size_t waitingMessages = 0; ///< in all queues
+    std::size_t waitingMessages = 0; ///< in all queues, with a buffer or without
 };
 
 } // namespace DspLinkHost

@@ -277,6 +277,14 @@ private slots:
         QCOMPARE(MSGQ_getMsgSize(message), 129);
         QCOMPARE(bits(MSGQ_free(message)), 0x8000U);
         QCOMPARE(bits(MSGQ_alloc(0, 2049, &message)), 0x8000800BU);
+        std::vector<MSGQ_Msg> held;
+        for (int number = 0; number < 18; ++number) {
+            QCOMPARE(bits(MSGQ_alloc(0, 100, &message)), 0x8000U);
+            held.push_back(message);
+        }
+        QCOMPARE(bits(MSGQ_alloc(0, 100, &message)), 0x8000800CU);
+        for (const MSGQ_Msg buffer : held)
+            QCOMPARE(bits(MSGQ_free(buffer)), 0x8000U);
     }
 
     void impossiblePoolsAreRefused()

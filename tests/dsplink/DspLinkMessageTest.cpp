@@ -1,11 +1,13 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
+#include "dsplink/host/Connection.h"
 #include "tests/dsplink/DspLinkTestCase.h"
 
 #include <QElapsedTimer>
 #include <QScopeGuard>
 
+#include <atomic>
 #include <future>
 #include <set>
 #include <thread>
@@ -15,6 +17,25 @@
 class DspLinkMessageTest : public DspLinkTestCase
 {
     Q_OBJECT
+
+private:
+    static constexpr int kept = 1024; ///< all that the library holds
+
+    /// Waits until the library has all that it keeps, and whoever counts up `sent` stands still.
+    static bool isHeldBackAboveWhatIsKept(const std::atomic<int>& sent)
+    {
+        int before = 0;
+        return QTest::qWaitFor(
+            [&] {
+                before = sent;
+                QTest::qSleep(200);
+                return before > kept && before == sent;
+            },
+            20000);
+    }
+
+    /// A reply comes after the messages that were sent before it.
+    bool everythingSentHasArrived() { return locate(longWait) == DSP_SOK; }
 
 private slots:
     void aMessageTravelsWhole()
@@ -116,6 +137,76 @@ private slots:
             MSGQ_free(buffer);
     }
 
+    void messagesInFlightShareThePoolWhicheverWayTheyGo()
+    {
+        constexpr char large = 'a';
+        openAll();
+        for (char number = 0; number < 12; ++number)
+            QVERIFY(peer->sendMessage(QByteArray(2028, static_cast<char>(large + number))));
+        QVERIFY(everythingSentHasArrived());
+        // Two have waited for a buffer and take the first that are given back.
+        for (char number = 0; number < 12; ++number) {
+            QCOMPARE(bits(put("no room")), number < 3 ? 0x8000800CU : 0x8000U);
+            QCOMPARE(fetched(), QByteArray(2028, static_cast<char>(large + number)));
+        }
+    }
+
+    void smallMessagesLeaveTheLargeBuffersAlone()
+    {
+        openAll();
+        for (int number = 0; number < 8; ++number)
+            QVERIFY(peer->sendMessage(QByteArray(108, 'x')));
+        QVERIFY(everythingSentHasArrived());
+        QVERIFY(!canAllocate(128) && canAllocate());
+        for (int number = 0; number < 10; ++number)
+            QVERIFY(peer->sendMessage(QByteArray(108, 'y')));
+        QVERIFY(everythingSentHasArrived());
+        QVERIFY(!canAllocate()); // with the small ones out they do for small messages, too
+        for (int number = 0; number < 18; ++number)
+            QCOMPARE(fetched(), QByteArray(108, number < 8 ? 'x' : 'y'));
+    }
+
+    void aMessageThatNoBufferHoldsIsDropped()
+    {
+        static Uint32 smallSizes[] = {128};
+        static Uint32 four[] = {4};
+        SMAPOOL_Attrs small{1, smallSizes, four, TRUE};
+        attach();
+        QCOMPARE(bits(POOL_open(0, &small)), 0x8000U);
+        QCOMPARE(bits(openQueue(hostName, &hostQueue)), 0x8000U);
+        QCOMPARE(bits(PROC_load(0, imagePath, 0, nullptr)), 0x8000U);
+        QCOMPARE(bits(PROC_start(0)), 0x8000U);
+        QCOMPARE(bits(MSGQ_transportOpen(0, &transport)), 0x8000U);
+        QVERIFY(peer->sendMessage(QByteArray(109, 'x')));
+        QVERIFY(peer->sendMessage(QByteArray(108, 'x')));
+        QCOMPARE(fetched(), QByteArray(108, 'x'));
+    }
+
+    void closingAQueueGivesBackWhatNobodyFetched_data()
+    {
+        QTest::addColumn<bool>("peerGoes");
+        QTest::newRow("with the peer") << false;
+        QTest::newRow("without") << true;
+    }
+
+    void closingAQueueGivesBackWhatNobodyFetched()
+    {
+        QFETCH(const bool, peerGoes);
+        openAll();
+        for (int number = 0; number < 12; ++number)
+            QVERIFY(peer->sendMessage(QByteArray(2028, 'x')));
+        QVERIFY(everythingSentHasArrived());
+        QVERIFY(!canAllocate());
+        if (peerGoes) {
+            peer->hangUp();
+            QTRY_COMPARE(bits(PROC_attach(0, nullptr)), 0x8000801BU);
+        }
+        QCOMPARE(bits(POOL_close(0)), 0x80008008U);
+        QCOMPARE(bits(MSGQ_close(hostQueue)), 0x8000U);
+        openQueues.clear();
+        QCOMPARE(bits(POOL_close(0)), 0x800DU);
+    }
+
     void locatingWaitsUntilTheFirmwareHasMadeItsQueue()
     {
         peer->keepSilentOn(DspPeer::Locate);
@@ -172,6 +263,67 @@ private slots:
         peer->keepSilentOn(DspPeer::Attach);
         QCOMPARE(bits(PROC_setup(nullptr)), 0x8000U);
         QCOMPARE(bits(PROC_attach(0, nullptr)), 0x80008017U);
+        // Who owes a reply is dead: the next to ask does not wait.
+        MSGQ_Queue queue = 0;
+        QCOMPARE(bits(openQueue("other", &queue)), 0x80008008U);
+        QVERIFY(!peer->requestKinds().contains(DspPeer::QueueOpen));
+        QTRY_COMPARE(bits(PROC_attach(0, nullptr)), 0x8000801BU);
+        // And like any lost peer it is connected to anew.
+        peer->answer(DspPeer::Attach, DspPeer::done);
+        attach();
+    }
+
+    void aPeerThatRepliesToNothingIsWaitedForOnceAtTheEnd_data()
+    {
+        QTest::addColumn<int>("kind");
+        QTest::addColumn<QList<DspPeer::Kind>>("asked");
+        const QList<DspPeer::Kind> closing{DspPeer::TransportClose, DspPeer::Stop, DspPeer::QueueClose,
+                                           DspPeer::Detach};
+        const QList<const char*> names{"transport close", "stop", "queue close", "detach"};
+        for (int first = 0; first < closing.size(); ++first)
+            QTest::newRow(names[first]) << int{closing[first]} << closing.first(first + 1);
+    }
+
+    void aPeerThatRepliesToNothingIsWaitedForOnceAtTheEnd()
+    {
+        QFETCH(const int, kind);
+        QFETCH(const QList<DspPeer::Kind>, asked);
+        openAll();
+        peer->keepSilentOn(static_cast<DspPeer::Kind>(kind));
+        const auto before = peer->requestKinds().size();
+        QElapsedTimer timer;
+        timer.start();
+        MSGQ_transportClose(0);
+        PROC_stop(0);
+        MSGQ_close(hostQueue);
+        POOL_close(0);
+        PROC_detach(0);
+        openQueues.clear();
+        QVERIFY2(timer.elapsed() < 3000, qPrintable(QString::number(timer.elapsed())));
+        QCOMPARE(peer->requestKinds().mid(before), asked);
+    }
+
+    void aLocateNeverOutlivesTheTransport()
+    {
+        struct Nobody : DspLinkHost::ConnectionListener
+        {
+            void messageArrived(std::uint32_t, DspLinkHost::ByteView) override {}
+            void messageSent(const void*) override {}
+            bool hasRoomForMessages() override { return true; }
+            void connectionLost() override {}
+        } nobody;
+        peer->keepSilentOn(DspPeer::Locate);
+        DSP_STATUS status = DSP_EFAIL;
+        const auto connection = DspLinkHost::Connection::open("/dev/dsplink", nobody, status);
+        QVERIFY(connection);
+        const auto locate = [&](std::uint32_t limit) {
+            return bits(connection->request(DspLinkHost::PacketKind::Locate, DspLinkHost::textPayload("Q"), limit));
+        };
+        connection->openTransport();
+        QCOMPARE(locate(100), 0x80008017U);
+        // A thread that found the transport open may come too late to be woken by its end.
+        connection->closeTransport();
+        QCOMPARE(locate(100), 0x80008008U);
     }
 
     void messagesBeforeTheTransportIsOpenAreKept()
@@ -216,7 +368,6 @@ private slots:
 
     void aFullQueueIsFetchedEvenWhenNobodyServesTheDriverAnyMore()
     {
-        constexpr int kept = 1024; // all that the library holds
         openAll();
         for (quint32 number = 0; number < kept; ++number)
             QVERIFY(peer->sendMessage(DspPeer::words({number})));
@@ -297,10 +448,7 @@ private slots:
         }
         auto closing = std::async(std::launch::async, [] { return bits(MSGQ_transportClose(0)); });
         QTRY_COMPARE(bits(put("closed")), 0x80008008U);
-        QVERIFY(QTest::qWaitFor([] {
-            MSGQ_Msg message = nullptr;
-            return MSGQ_alloc(0, 2048, &message) == DSP_SOK && MSGQ_free(message) == DSP_SOK;
-        }));
+        QTRY_VERIFY(canAllocate());
         peer->setReading(true);
         QCOMPARE(closing.get(), 0x800DU);
     }
@@ -309,14 +457,16 @@ private slots:
     {
         constexpr int burst = 3000;
         openAll();
-        auto sender = std::async(std::launch::async, [this] {
-            for (quint32 number = 0; number < burst; ++number) {
-                if (!peer->sendMessage(DspPeer::words({number}) + QByteArray(500, 'x')))
+        std::atomic<int> sent = 0;
+        auto sender = std::async(std::launch::async, [this, &sent] {
+            for (; sent < burst; ++sent) {
+                if (!peer->sendMessage(DspPeer::words({static_cast<quint32>(sent)}) + QByteArray(500, 'x')))
                     return false;
             }
             return true;
         });
-        QVERIFY(sender.wait_for(std::chrono::milliseconds(200)) == std::future_status::timeout); // held back
+        QVERIFY(isHeldBackAboveWhatIsKept(sent));
+        QVERIFY(sent < burst);
         for (quint32 number = 0; number < burst; ++number)
             QCOMPARE(fetched().first(4), DspPeer::words({number}));
         QVERIFY(sender.get());
@@ -325,12 +475,13 @@ private slots:
     void aRequestGetsThroughWhileMessagesPileUp()
     {
         openAll();
-        auto sender = std::async(std::launch::async, [this] {
-            while (peer->sendMessage(QByteArray(2028, 'x'))) {
-            }
+        std::atomic<int> sent = 0;
+        auto sender = std::async(std::launch::async, [this, &sent] {
+            while (peer->sendMessage(QByteArray(2028, 'x')))
+                ++sent;
         });
         const auto silence = qScopeGuard([this] { peer->hangUp(); });
-        QTest::qSleep(100);
+        QVERIFY(isHeldBackAboveWhatIsKept(sent));
         QCOMPARE(bits(locate(longWait)), 0x8000U);
         QCOMPARE(bits(MSGQ_transportClose(0)), 0x800DU);
         QCOMPARE(bits(PROC_stop(0)), 0x800CU);

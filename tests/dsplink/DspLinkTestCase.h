@@ -115,6 +115,13 @@ protected:
         return sent;
     }
 
+    /// False when all buffers of this size are out.
+    static bool canAllocate(Uint16 size = 2048)
+    {
+        MSGQ_Msg message = nullptr;
+        return MSGQ_alloc(0, size, &message) == DSP_SOK && MSGQ_free(message) == DSP_SOK;
+    }
+
 private slots:
     void init()
     {

@@ -129,6 +129,7 @@ void EndSystemTest::terminationSignalEndsTheProgramInOrder_data()
     row("line that hangs up", {}, "radio.line", "hung-up");
     row("no DSP", {"dsp.presence=missing"});
     row("silent DSP", {"dsp.ack=off"});
+    row("DSP link that answers nothing any more", {}, "dsp.replies", false);
     row("DSP that is lost", {}, "dsp.presence", "missing");
     row("no sound card", {"audio.presence=missing"});
     row("broken card", {}, "sd.fault", "EIO");

@@ -114,6 +114,26 @@ private slots:
         request(failing, bodies[failing - 1], failed);
     }
 
+    void noRequestIsAnsweredWhenRepliesAreOff()
+    {
+        bringUp();
+        set("dsp.replies", false);
+        program->forget();
+        QVERIFY(program->send("0700000064000000")); // transport close
+        acknowledged("08000100", "01000000");       // the next thing that comes
+        QCOMPARE(program->packets().size(), 1);
+        QCOMPARE(text("dsp.state"), QStringLiteral("connected"));
+        set("dsp.replies", true);
+        request(7, "", done);
+    }
+
+    void namesOfQueuesAreUniqueOverBothProcessors()
+    {
+        request(1, attachBody, done);
+        request(2, "02000100" + dspQueue, failed);
+        request(2, armQueue, done);
+    }
+
     void everyCommandIsCarriedOutAndAcknowledged()
     {
         bringUp();

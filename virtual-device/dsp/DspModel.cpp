@@ -114,6 +114,8 @@ void DspModel::request(const DspPacket& packet)
         if (rule.kind != packet.kind || packet.body.size() < rule.shortestBody)
             continue;
         registry.count(QStringLiteral("dsp.requests"));
+        if (!registry.flag(QStringLiteral("dsp.replies")))
+            return;
         if (state < rule.from || state > rule.upTo) {
             report(QStringLiteral("%1 out of order").arg(QLatin1String(rule.name)));
             reply(packet, Status::WrongState);
@@ -184,7 +186,10 @@ void DspModel::attach(const DspPacket& request)
 
 void DspModel::queueOpen(const DspPacket& request)
 {
-    queues.insert(request.body.mid(4), dspWord(request.body, 0));
+    const QByteArray opened = request.body.mid(4);
+    if (opened == name(dspQueueName)) // unique over both processors
+        return reply(request, Status::Failed);
+    queues.insert(opened, dspWord(request.body, 0));
     reply(request, Status::Done);
 }
 

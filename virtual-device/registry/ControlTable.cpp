@@ -150,6 +150,8 @@ constexpr std::array controls{
                   "ends its connection, refusing turns the next one away"),
     choiceControl("dsp.refuse", "none|attach|queue|load|start|transport|locate|transport-close|stop|queue-close|detach",
                   "none", "the request that fails"),
+    switchControl("dsp.replies", "on",
+                  "off: no request is carried out or answered, as if the DSP were dead behind a link that stands"),
     choiceControl("dsp.locate", "found|late|never|missing", "found",
                   "how the search for the firmware's queue is answered; late: after dsp.ack_delay"),
     choiceControl(
