@@ -24,6 +24,10 @@ file(WRITE "${sdk}/gpp/inc/usr/msgq.h" "")
 expect(not-built "no dsplink.lib in ${bin}/<board>/RELEASE. Build DSPLink first" -DDSPLINK_ROOT=${sdk})
 
 file(WRITE "${bin}/BOARD/RELEASE/dsplink.lib" "")
+expect(no-defines "no defines in ${bin}/BOARD/RELEASE/*_defines.txt: give those of the build with -DDSPLINK_DEFINES=..."
+  -DDSPLINK_ROOT=${sdk})
+expect(given-defines "INTERFACE_COMPILE_DEFINITIONS=MAX_DSPS=2;PROC_COMPONENT" -DDSPLINK_ROOT=${sdk}
+  "-DDSPLINK_DEFINES=-DMAX_DSPS=2\\;PROC_COMPONENT")
 file(WRITE "${bin}/BOARD/RELEASE/msgq_defines.txt" "-DMAX_DSPS=1 -DMSGQ_COMPONENT\n")
 expect(library "IMPORTED_LOCATION=${bin}/BOARD/RELEASE/dsplink.lib" -DDSPLINK_ROOT=${sdk})
 expect(headers "INTERFACE_INCLUDE_DIRECTORIES=${sdk}/gpp/inc;${sdk}/gpp/inc/usr;${sdk}/gpp/inc/sys" -DDSPLINK_ROOT=${sdk})
@@ -31,6 +35,7 @@ expect(defines "INTERFACE_COMPILE_DEFINITIONS=MAX_DSPS=1;MSGQ_COMPONENT" -DDSPLI
 expect(no-debug "no dsplink.lib in ${bin}/<board>/DEBUG" -DDSPLINK_ROOT=${sdk} -DDSPLINK_BUILD=DEBUG)
 
 file(WRITE "${bin}/OTHER/RELEASE/dsplink.lib" "")
+file(WRITE "${bin}/OTHER/RELEASE/proc_defines.txt" "-DMAX_DSPS=1\n")
 expect(two-boards "several boards are built below ${bin}: choose one with -DDSPLINK_PLATFORM=..." -DDSPLINK_ROOT=${sdk})
 expect(chosen "IMPORTED_LOCATION=${bin}/OTHER/RELEASE/dsplink.lib" -DDSPLINK_ROOT=${sdk} -DDSPLINK_PLATFORM=OTHER)
 expect(wrong-board "no dsplink.lib in" -DDSPLINK_ROOT=${sdk} -DDSPLINK_PLATFORM=THIRD)
