@@ -2,7 +2,7 @@
 # SPDX-License-Identifier: MIT
 
 # cmake -DSOURCE=folder -DWORK=folder -DGENERATOR=name -DCOMPILER=path -P sdk-build-test.cmake
-# Configures the project with a tree that has the shape of the chip maker's SDK, and compiles what uses its headers.
+# Configures the program, as for the device, with a tree that has the shape of the chip maker's SDK, and compiles what uses its headers.
 # That alone: there is nothing to link with, and on a 64-bit machine words of type "long" have the wrong size.
 function(run)
   execute_process(COMMAND ${ARGN} OUTPUT_VARIABLE output ERROR_VARIABLE output RESULT_VARIABLE result)
@@ -17,7 +17,7 @@ file(COPY "${CMAKE_CURRENT_LIST_DIR}/sdk" DESTINATION "${WORK}")
 file(WRITE "${board}/dsplink.lib" "")
 file(WRITE "${board}/dsplink_defines.txt" "-DMAX_DSPS=1\n")
 run("${CMAKE_COMMAND}" -S "${SOURCE}" -B "${WORK}/build" --fresh -G "${GENERATOR}" "-DCMAKE_CXX_COMPILER=${COMPILER}"
-  "-DDSPLINK_ROOT=${WORK}/sdk" -DIMMUNITYRIG_WERROR=ON -DCMAKE_DISABLE_PRECOMPILE_HEADERS=ON
+  "-DDSPLINK_ROOT=${WORK}/sdk" -DIMMUNITYRIG_PROGRAM_ONLY=ON -DIMMUNITYRIG_WERROR=ON -DCMAKE_DISABLE_PRECOMPILE_HEADERS=ON
   -DCMAKE_EXPORT_COMPILE_COMMANDS=ON)
 
 file(READ "${WORK}/build/compile_commands.json" commands)
