@@ -11,6 +11,7 @@
 #include <QTemporaryDir>
 #include <QTest>
 
+#include <linux/fs.h>
 #include <sys/stat.h>
 #include <sys/statvfs.h>
 
@@ -33,6 +34,7 @@ private slots:
     void appendingGoesToTheEnd();
     void removedFileStaysReadableWhileOpen();
     void foldersAreMadeListedAndRemoved();
+    void folderTakesNoRequestAndGoesOn();
     void linksAreLinks();
     void sizeOfThePartitionIsTheHosts();
     void readOnlyRefusesEveryChangeAndStillReads();
@@ -138,6 +140,17 @@ void DataPartitionTest::foldersAreMadeListedAndRemoved()
     QCOMPARE(QDir(at("x/y")).entryList(QDir::Files).size(), 300);
     QVERIFY(QDir(at("x")).removeRecursively());
     QVERIFY(QDir(folder->path()).isEmpty());
+}
+
+void DataPartitionTest::folderTakesNoRequestAndGoesOn()
+{
+    QVERIFY(QDir(mountPoint->path()).mkdir("made"));
+    const RawFile open(at("made"), O_RDONLY | O_DIRECTORY);
+    QVERIFY(TestSupport::errorOfRequest(open, FS_IOC_GETFLAGS) > 0);
+    QCOMPARE(::fsync(open.handle()), 0);
+    QCOMPARE(::lseek(open.handle(), 0, SEEK_SET), 0);
+    write(at("made/a"), "content");
+    QCOMPARE(read(behind("made/a")), "content");
 }
 
 void DataPartitionTest::linksAreLinks()

@@ -8,10 +8,13 @@
 
 #include <QDir>
 #include <QFile>
+#include <QScopeGuard>
 #include <QTest>
 
+#include <linux/fs.h>
 #include <linux/rtc.h>
 #include <sys/ioctl.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 
 #include <atomic>
@@ -81,6 +84,8 @@ private slots:
     void measurementsCannotBeWritten();
     void nothingCanBeMadeOrRemoved();
     void foldersListWhatIsThere();
+    void folderTakesNoRequestAndGoesOn_data();
+    void folderTakesNoRequestAndGoesOn();
     void clockRunsOnFromWhatItWasSetTo();
     void clockStandsStillWhenStopped();
     void clockStartsAtTheHostsTime();
@@ -93,6 +98,8 @@ private slots:
     void valuesMayChangeWhileManyRead();
     void unmountLeavesNothingAndFailsOpenFiles();
     void mountPointThatDoesNotExistIsReported();
+    void mountWithFewDescriptorsEndsOrIsReported();
+    void readingARequestThatIsGoneDoesNotBlock();
 
 private:
     [[nodiscard]] int readClock(rtc_time& time) const;
@@ -407,6 +414,27 @@ void DeviceTreeTest::foldersListWhatIsThere()
     QVERIFY(names("sys/bus/usb/devices").isEmpty());
 }
 
+void DeviceTreeTest::folderTakesNoRequestAndGoesOn_data()
+{
+    QTest::addColumn<QString>("folder");
+    QTest::addRow("root of the mount") << "";
+    QTest::addRow("folder between") << "sys/class";
+    QTest::addRow("device behind a link") << hid;
+}
+
+/// What tools such as lsattr, or a terminal's library, ask of any descriptor.
+void DeviceTreeTest::folderTakesNoRequestAndGoesOn()
+{
+    QFETCH(const QString, folder);
+    const RawFile open(at(folder), O_RDONLY | O_DIRECTORY);
+    QCOMPARE(open.error(), 0);
+    for (const unsigned long request : {FS_IOC_GETFLAGS, FS_IOC_FSGETXATTR, RTC_RD_TIME})
+        QCOMPARE(TestSupport::errorOfRequest(open, request), ENOTTY);
+    QCOMPARE(::fsync(open.handle()), 0);
+    QCOMPARE(::lseek(open.handle(), 0, SEEK_SET), 0);
+    QCOMPARE(contentOf(at(voltage)), "4100000\n");
+}
+
 int DeviceTreeTest::readClock(rtc_time& time) const
 {
     const RawFile clock(at("rtc"), O_RDWR);
@@ -556,6 +584,42 @@ void DeviceTreeTest::mountPointThatDoesNotExistIsReported()
     const auto problem = other.mount(at("missing"));
     QVERIFY(problem.has_value());
     QVERIFY2(problem->startsWith(at("missing") + ": cannot be mounted: "), qPrintable(*problem));
+}
+
+/// Whichever of the mount's descriptors is the one too many.
+void DeviceTreeTest::mountWithFewDescriptorsEndsOrIsReported()
+{
+    tree->unmount();
+    rlimit usual{};
+    QCOMPARE(::getrlimit(RLIMIT_NOFILE, &usual), 0);
+    const auto restore = qScopeGuard([&] { ::setrlimit(RLIMIT_NOFILE, &usual); });
+    const int firstFree = ::dup(STDERR_FILENO);
+    ::close(firstFree);
+    int mounted = 0;
+    for (rlim_t spare = 0; spare < 6; ++spare) {
+        const rlimit few{static_cast<rlim_t>(firstFree) + spare, usual.rlim_max};
+        QCOMPARE(::setrlimit(RLIMIT_NOFILE, &few), 0);
+        const auto problem = tree->mount(mountPoint->path());
+        mounted += problem ? 0 : 1;
+        QVERIFY2(!problem || problem->startsWith(mountPoint->path() + ": cannot be mounted: "), qPrintable(*problem));
+        tree->unmount();
+    }
+    QVERIFY(mounted > 0);
+    QVERIFY(mounted < 6);
+}
+
+/// A client that is killed takes its request back, also between the news of it and the reading.
+void DeviceTreeTest::readingARequestThatIsGoneDoesNotBlock()
+{
+    int found = 0;
+    const auto descriptors = QDir("/proc/self/fd").entryList(QDir::AllEntries | QDir::System | QDir::NoDotAndDotDot);
+    for (const auto& descriptor : descriptors) {
+        if (QFile::symLinkTarget("/proc/self/fd/" + descriptor) != u"/dev/fuse")
+            continue;
+        ++found;
+        QVERIFY((::fcntl(descriptor.toInt(), F_GETFL) & O_NONBLOCK) != 0);
+    }
+    QCOMPARE(found, 1);
 }
 
 QTEST_GUILESS_MAIN(DeviceTreeTest)

@@ -7,8 +7,11 @@
 #include <QTest>
 
 #include <fcntl.h>
+#include <sys/ioctl.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
 #include <utility>
 
@@ -67,5 +70,22 @@ private:
     int descriptor;
     int reason;
 };
+
+/// The errno of an ioctl, 0 when it went well; -1 when its process died. Another process asks: one that serves the file
+/// system itself could not even die of a fault in it, as its own question would wait for the answer.
+inline int errorOfRequest(const RawFile& file, unsigned long request)
+{
+    const pid_t asking = ::fork();
+    if (asking == 0) {
+        // Nor could it while anybody else holds its end of the file system.
+        const auto handle = static_cast<unsigned>(file.handle());
+        ::close_range(handle + 1, ~0U, 0);
+        ::close_range(0, handle - 1, 0);
+        std::array<char, 64> answer{};
+        ::_exit(::ioctl(file.handle(), request, answer.data()) == 0 ? 0 : errno);
+    }
+    int status = 0;
+    return ::waitpid(asking, &status, 0) == asking && WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
 
 } // namespace TestSupport

@@ -86,7 +86,13 @@ QString stamp(const QDateTime& time)
 struct TreeOperations
 {
     static DeviceTree& tree() { return *static_cast<DeviceTree*>(::fuse_get_context()->private_data); }
-    static DeviceTree::OpenFile& file(fuse_file_info* info) { return tree().openFiles.at(info->fh); }
+
+    /// None: the handle is not of a file of ours, as that of a folder, which is opened without us.
+    static DeviceTree::OpenFile* file(const fuse_file_info* info)
+    {
+        const auto found = tree().openFiles.find(info->fh);
+        return found == tree().openFiles.end() ? nullptr : &found->second;
+    }
 
     static int getattr(const char* path, struct stat* status, fuse_file_info*)
     {
@@ -149,20 +155,25 @@ struct TreeOperations
 
     static int read(const char*, char* buffer, size_t size, off_t offset, fuse_file_info* info)
     {
-        auto& open = file(info);
-        if (offset == 0 || !open.isFilled) {
-            const int error = tree().refresh(open);
+        auto* const open = file(info);
+        if (open == nullptr)
+            return -EBADF;
+        if (offset == 0 || !open->isFilled) {
+            const int error = tree().refresh(*open);
             if (error != 0)
                 return -error;
         }
-        const auto part = open.content.mid(static_cast<qsizetype>(offset), static_cast<qsizetype>(size));
+        const auto part = open->content.mid(static_cast<qsizetype>(offset), static_cast<qsizetype>(size));
         std::memcpy(buffer, part.constData(), static_cast<std::size_t>(part.size()));
         return static_cast<int>(part.size());
     }
 
     static int write(const char*, const char* bytes, size_t size, off_t, fuse_file_info* info)
     {
-        const int error = tree().write(*file(info).entry, QByteArray(bytes, static_cast<qsizetype>(size)));
+        const auto* const open = file(info);
+        if (open == nullptr)
+            return -EBADF;
+        const int error = tree().write(*open->entry, QByteArray(bytes, static_cast<qsizetype>(size)));
         return error != 0 ? -error : static_cast<int>(size);
     }
 
@@ -175,10 +186,11 @@ struct TreeOperations
 
     static int ioctl(const char*, unsigned request, void*, fuse_file_info* info, unsigned, void* data)
     {
-        const TreeEntry& entry = *file(info).entry;
-        if (entry.kind != TreeEntry::Kind::Clock || request != static_cast<unsigned>(RTC_RD_TIME) || data == nullptr)
+        const auto* const open = file(info);
+        if (open == nullptr || open->entry->kind != TreeEntry::Kind::Clock ||
+            request != static_cast<unsigned>(RTC_RD_TIME) || data == nullptr)
             return -ENOTTY;
-        const int error = tree().fault(entry);
+        const int error = tree().fault(*open->entry);
         if (error != 0)
             return error == ENOENT ? -ENODEV : -error;
         const rtc_time now = tree().clock.read();
