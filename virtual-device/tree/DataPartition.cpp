@@ -96,6 +96,11 @@ struct PartitionOperations
         if (descriptor < 0)
             return -errno;
         DIR* folder = ::fdopendir(descriptor);
+        if (folder == nullptr) {
+            const int reason = errno;
+            ::close(descriptor);
+            return -reason;
+        }
         card().openFolders.insert(folder);
         info->fh = reinterpret_cast<std::uintptr_t>(folder);
         return 0;

@@ -3,6 +3,7 @@
 
 #include "virtual-device/tree/FuseMount.h"
 
+#include <fcntl.h>
 #include <fuse3/fuse_lowlevel.h>
 #include <poll.h>
 #include <sys/eventfd.h>
@@ -44,6 +45,11 @@ template <typename Function> std::thread threadWithoutSignals(Function function)
     return started;
 }
 
+QString failure(const QString& mountPoint, const QString& reason)
+{
+    return QStringLiteral("%1: cannot be mounted: %2").arg(mountPoint, reason);
+}
+
 } // namespace
 
 FuseMount::~FuseMount()
@@ -54,6 +60,25 @@ FuseMount::~FuseMount()
 std::optional<QString> FuseMount::mount(const QString& mountPoint, fuse_operations operations, void* owner, Names names)
 {
     unmount();
+    // Without it the thread could not be ended.
+    stopEvent = ::eventfd(0, EFD_CLOEXEC);
+    if (stopEvent < 0)
+        return failure(mountPoint, qt_error_string(errno));
+    auto problem = attach(mountPoint, operations, owner, names);
+    if (problem) {
+        ::close(stopEvent);
+        return problem;
+    }
+    const int session = ::fuse_session_fd(::fuse_get_session(instance));
+    // A client that is killed takes its request back, which a reading that was told of it must not wait for.
+    ::fcntl(session, F_SETFL, ::fcntl(session, F_GETFL) | O_NONBLOCK);
+    thread = threadWithoutSignals([this, session] { serve(session); });
+    return std::nullopt;
+}
+
+std::optional<QString> FuseMount::attach(const QString& mountPoint, fuse_operations operations, void* owner,
+                                         Names names)
+{
     operations.init = names == Names::Removable ? configure<Names::Removable> : configure<Names::Permanent>;
     std::string program = "virtual-device";
     std::string option = "-ofsname=virtual-device";
@@ -62,17 +87,14 @@ std::optional<QString> FuseMount::mount(const QString& mountPoint, fuse_operatio
     instance = ::fuse_new(&arguments, &operations, sizeof operations, owner);
     ::fuse_opt_free_args(&arguments);
     if (instance == nullptr)
-        return QStringLiteral("%1: libfuse refuses to start").arg(mountPoint);
+        return failure(mountPoint, QStringLiteral("libfuse refuses to start"));
     errno = 0;
     if (::fuse_mount(instance, mountPoint.toLocal8Bit().constData()) != 0) {
         const QString reason = errno == 0 ? QStringLiteral("see the line above") : qt_error_string(errno);
         ::fuse_destroy(instance);
         instance = nullptr;
-        return QStringLiteral("%1: cannot be mounted: %2").arg(mountPoint, reason);
+        return failure(mountPoint, reason);
     }
-    stopEvent = ::eventfd(0, EFD_CLOEXEC);
-    const int session = ::fuse_session_fd(::fuse_get_session(instance));
-    thread = threadWithoutSignals([this, session] { serve(session); });
     return std::nullopt;
 }
 

@@ -43,6 +43,8 @@ public:
     void unmount();
 
 private:
+    [[nodiscard]] std::optional<QString> attach(const QString& mountPoint, fuse_operations operations, void* owner,
+                                                Names names);
     void serve(int session);
 
     fuse* instance = nullptr;
