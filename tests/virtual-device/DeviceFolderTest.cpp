@@ -3,11 +3,17 @@
 
 #include "virtual-device/sandbox/DeviceFolder.h"
 
+#include "virtual-device/tree/Mounts.h"
+
 #include <QDir>
 #include <QFile>
+#include <QScopeGuard>
 #include <QTemporaryDir>
 #include <QTest>
 
+#include <fcntl.h>
+#include <linux/fs.h>
+#include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -34,7 +40,11 @@ private slots:
     void cleanUpRemovesWhatAKilledDeviceLeft();
     void cleanUpLeavesRunningDevicesAlone();
     void claimReplacesWhatAKilledDeviceLeft();
+    void whatCannotBeRemovedIsKeptForTheNextCleanUp();
     void controlSocketBelongsToTheName();
+    void rootIsTheSameHoweverTheRuntimeFolderIsSpelt_data();
+    void rootIsTheSameHoweverTheRuntimeFolderIsSpelt();
+    void mountIsFoundHoweverItsFolderIsSpelt();
 };
 
 namespace
@@ -48,6 +58,18 @@ void leaveBehind(const QString& name)
     QDir().mkpath(DeviceFolder::root() + '/' + name + "/state/mnt");
     QFile lock(DeviceFolder::root() + '/' + name + ".lock");
     QVERIFY(lock.open(QIODevice::WriteOnly));
+}
+
+/// Whether the folder can be made one that root, too, can neither empty nor remove, or back.
+bool makeImmutable(const QByteArray& folder, bool isWanted)
+{
+    const int descriptor = ::open(folder.constData(), O_RDONLY | O_CLOEXEC);
+    int flags = 0;
+    bool isDone = ::ioctl(descriptor, FS_IOC_GETFLAGS, &flags) == 0;
+    flags = isWanted ? flags | FS_IMMUTABLE_FL : flags & ~FS_IMMUTABLE_FL;
+    isDone = isDone && ::ioctl(descriptor, FS_IOC_SETFLAGS, &flags) == 0;
+    ::close(descriptor);
+    return isDone;
 }
 
 } // namespace
@@ -211,6 +233,55 @@ void DeviceFolderTest::claimReplacesWhatAKilledDeviceLeft()
     DeviceFolder folder;
     QCOMPARE(folder.claim("bench"), std::nullopt);
     QVERIFY(QDir(folder.path()).isEmpty());
+}
+
+/// An unnamed device takes the next name then.
+void DeviceFolderTest::whatCannotBeRemovedIsKeptForTheNextCleanUp()
+{
+    leaveBehind("device-1");
+    const QByteArray held = DeviceFolder::root().toLocal8Bit() + "/device-1/state/mnt";
+    if (!makeImmutable(held, true))
+        QSKIP("this user cannot keep itself from removing a folder here");
+    const auto release = qScopeGuard([&] { (void)makeImmutable(held, false); });
+    QCOMPARE(DeviceFolder::cleanUp(), QStringList());
+    QVERIFY(QFile::exists(DeviceFolder::root() + "/device-1.lock"));
+    DeviceFolder unnamed;
+    QCOMPARE(unnamed.claim({}), std::nullopt);
+    QCOMPARE(unnamed.name(), "device-2");
+    DeviceFolder named;
+    QCOMPARE(named.claim("device-1"), DeviceFolder::root() + "/device-1: cannot make the device's folder: File exists");
+    named.release();
+    QVERIFY(makeImmutable(held, false));
+    QCOMPARE(DeviceFolder::cleanUp(), QStringList{"device-1"});
+}
+
+void DeviceFolderTest::rootIsTheSameHoweverTheRuntimeFolderIsSpelt_data()
+{
+    QTest::addColumn<QString>("spelling");
+    QTest::addRow("slash at the end") << "%1/";
+    QTest::addRow("slashes") << "%1///";
+    QTest::addRow("dots") << "%1/virtual-device/..";
+    QTest::addRow("link") << "%1.link";
+    QTest::addRow("link with a slash") << "%1.link/";
+}
+
+/// The mount table knows one spelling alone.
+void DeviceFolderTest::rootIsTheSameHoweverTheRuntimeFolderIsSpelt()
+{
+    QFETCH(const QString, spelling);
+    const QString link = runtime->path() + ".link";
+    QVERIFY(QFile::link(runtime->path(), link));
+    const auto remove = qScopeGuard([&] { QFile::remove(link); });
+    qputenv("XDG_RUNTIME_DIR", spelling.arg(runtime->path()).toLocal8Bit());
+    QCOMPARE(DeviceFolder::root(), runtime->path() + "/virtual-device");
+}
+
+void DeviceFolderTest::mountIsFoundHoweverItsFolderIsSpelt()
+{
+    QCOMPARE(VirtualDevice::mountedBelow("/proc").last(), "/proc");
+    for (const auto* const spelling : {"//proc/", "/proc/.", "/proc/self/../../proc", "/proc/self/root/proc"})
+        QCOMPARE(VirtualDevice::mountedBelow(spelling), VirtualDevice::mountedBelow("/proc"));
+    QCOMPARE(VirtualDevice::mountedBelow("/pro"), QStringList());
 }
 
 void DeviceFolderTest::controlSocketBelongsToTheName()

@@ -12,10 +12,13 @@
 #include <QLibraryInfo>
 #include <QProcess>
 #include <QRegularExpression>
+#include <QScopeGuard>
 #include <QStandardPaths>
 #include <QTcpServer>
 #include <QTemporaryDir>
 #include <QTest>
+
+#include <sys/stat.h>
 
 #include <csignal>
 #include <memory>
@@ -139,6 +142,7 @@ private slots:
     void terminalThatTakesNothingHoldsNobodyUp();
     void askedToEndItTakesEverythingDown_data();
     void askedToEndItTakesEverythingDown();
+    void nextStartCleansUpAfterOneThatWasKilled_data();
     void nextStartCleansUpAfterOneThatWasKilled();
     void programThatIsKilledEndsItWithAReason();
     void programThatFailsIsExplainedByItsLastWords();
@@ -253,9 +257,27 @@ void VirtualDeviceCommandTest::askedToEndItTakesEverythingDown()
     QCOMPARE(device.process.exitCode(), 0);
 }
 
+void VirtualDeviceCommandTest::nextStartCleansUpAfterOneThatWasKilled_data()
+{
+    QTest::addColumn<QString>("spelling");
+    QTest::addRow("plain") << "%1";
+    QTest::addRow("slash at the end") << "%1/";
+    QTest::addRow("through a link") << "%1.link/inside";
+}
+
 void VirtualDeviceCommandTest::nextStartCleansUpAfterOneThatWasKilled()
 {
     REQUIRE_FUSE();
+    QFETCH(const QString, spelling);
+    const QString inside = runtime->path() + "/inside";
+    const QString link = runtime->path() + ".link";
+    QCOMPARE(::mkdir(qPrintable(inside), 0700), 0);
+    QVERIFY(QFile::link(runtime->path(), link));
+    const auto restore = qScopeGuard([&] {
+        qputenv("XDG_RUNTIME_DIR", runtime->path().toLocal8Bit());
+        QFile::remove(link);
+    });
+    qputenv("XDG_RUNTIME_DIR", spelling.arg(runtime->path()).toLocal8Bit());
     RunningDevice killed({"--name", "killed"});
     QVERIFY(killed.readyLine.startsWith("ready"));
     QCOMPARE(VirtualDevice::mountedBelow(runtime->path()).size(), 2);
@@ -271,6 +293,7 @@ void VirtualDeviceCommandTest::nextStartCleansUpAfterOneThatWasKilled()
     QCOMPARE(VirtualDevice::mountedBelow(runtime->path()).size(), 2);
     next.signal(SIGTERM);
     QVERIFY(next.process.waitForFinished(limit));
+    QVERIFY(QDir(DeviceFolder::root()).isEmpty());
 }
 
 void VirtualDeviceCommandTest::programThatIsKilledEndsItWithAReason()

@@ -113,21 +113,35 @@ void openFolders(const std::filesystem::path& folder)
     }
 }
 
-/// Never enters a file system that is mounted below the folder: what it shows may be the operator's own state.
-void removeFolder(const QString& folder)
+QString folderOf(const QString& name)
+{
+    return DeviceFolder::root() + u'/' + name;
+}
+
+/// Never enters a file system that is mounted below the folder: what it shows may be the operator's own state. Returns
+/// whether the folder is gone.
+bool removeFolder(const QString& folder)
 {
     unmountBelow(folder);
     if (!mountedBelow(folder).isEmpty())
-        return;
+        return false;
     openFolders(folder.toStdString());
     std::error_code ignored;
     std::filesystem::remove_all(folder.toStdString(), ignored);
+    struct stat status
+    {
+    };
+    return ::lstat(native(folder).constData(), &status) != 0 && errno == ENOENT;
 }
 
-void unlock(const QString& name, int descriptor)
+/// What cannot be removed keeps its lock's file, by which the next start finds it. Returns whether everything is gone.
+bool removeDevice(const QString& name, int lock)
 {
-    ::unlink(native(lockPath(name)).constData());
-    ::close(descriptor);
+    const bool isGone = removeFolder(folderOf(name));
+    if (isGone)
+        ::unlink(native(lockPath(name)).constData());
+    ::close(lock);
+    return isGone;
 }
 
 } // namespace
@@ -139,10 +153,12 @@ DeviceFolder::~DeviceFolder()
 
 QString DeviceFolder::root()
 {
-    const QString runtime = qEnvironmentVariable("XDG_RUNTIME_DIR");
+    const QString variable = qEnvironmentVariable("XDG_RUNTIME_DIR");
+    const QString runtime = variable.isEmpty() ? QString() : QFileInfo(variable).canonicalFilePath();
     if (!runtime.isEmpty() && isPrivateFolder(runtime))
         return runtime + QStringLiteral("/virtual-device");
-    return QStringLiteral("/tmp/virtual-device-%1").arg(::geteuid());
+    const QString temporary = QFileInfo(QStringLiteral("/tmp")).canonicalFilePath();
+    return QStringLiteral("%1/virtual-device-%2").arg(temporary).arg(::geteuid());
 }
 
 QStringList DeviceFolder::running()
@@ -161,7 +177,7 @@ QStringList DeviceFolder::running()
 
 QString DeviceFolder::controlSocket(const QString& name)
 {
-    return root() + u'/' + name + QStringLiteral("/control");
+    return folderOf(name) + QStringLiteral("/control");
 }
 
 bool DeviceFolder::isName(const QString& name)
@@ -180,13 +196,15 @@ std::optional<QString> DeviceFolder::nameProblem(const QString& name)
 QStringList DeviceFolder::cleanUp()
 {
     QStringList cleaned;
+    // Where the root is somebody else's, so is what is in it.
+    if (!isPrivateFolder(root()))
+        return cleaned;
     for (const auto& name : knownNames()) {
         const int descriptor = lockedFile(lockPath(name)).descriptor;
         if (descriptor < 0)
             continue;
-        removeFolder(root() + u'/' + name);
-        unlock(name, descriptor);
-        cleaned.append(name);
+        if (removeDevice(name, descriptor))
+            cleaned.append(name);
     }
     return cleaned;
 }
@@ -200,7 +218,6 @@ std::optional<QString> DeviceFolder::claim(const QString& name)
         return QStringLiteral("%1 is not a folder of this user with mode 0700: remove it").arg(root());
     if (auto problem = takeName(name))
         return problem;
-    removeFolder(path());
     if (::mkdir(native(path()).constData(), 0700) != 0)
         return QStringLiteral("%1: cannot make the device's folder: %2").arg(path(), qt_error_string(errno));
     return std::nullopt;
@@ -213,11 +230,14 @@ std::optional<QString> DeviceFolder::takeName(const QString& name)
         const auto attempt = lockedFile(lockPath(candidate));
         if (attempt.error != 0)
             return QStringLiteral("%1: cannot be made: %2").arg(lockPath(candidate), qt_error_string(attempt.error));
-        if (attempt.descriptor >= 0) {
+        const bool isFree = attempt.descriptor >= 0;
+        if (isFree && (removeFolder(folderOf(candidate)) || !name.isEmpty())) {
             deviceName = candidate;
             lock = attempt.descriptor;
             return std::nullopt;
         }
+        if (isFree)
+            ::close(attempt.descriptor); // what was left there cannot be removed
         if (!name.isEmpty())
             return QStringLiteral("a device named \"%1\" is running: choose another name with --name").arg(name);
     }
@@ -228,14 +248,13 @@ void DeviceFolder::release()
 {
     if (lock < 0)
         return;
-    removeFolder(path());
-    unlock(deviceName, lock);
+    (void)removeDevice(deviceName, lock);
     lock = -1;
 }
 
 QString DeviceFolder::path(const QString& relative) const
 {
-    const QString own = root() + u'/' + deviceName;
+    const QString own = folderOf(deviceName);
     return relative.isEmpty() ? own : own + u'/' + relative;
 }
 

@@ -25,7 +25,7 @@ public:
     DeviceFolder& operator=(const DeviceFolder&) = delete;
 
     /// `$XDG_RUNTIME_DIR/virtual-device`, or `/tmp/virtual-device-UID` where that variable is not set to a folder of
-    /// ours.
+    /// ours; without links, as the mount table has it.
     [[nodiscard]] static QString root();
     /// The names of the devices that run now.
     [[nodiscard]] static QStringList running();
@@ -36,7 +36,7 @@ public:
     /// What is wrong with a name that somebody chose.
     [[nodiscard]] static std::optional<QString> nameProblem(const QString& name);
 
-    /// Unmounts and removes what devices left that were killed; returns their names.
+    /// Unmounts and removes what devices left that were killed; returns the names of those of which nothing is left.
     static QStringList cleanUp();
 
     /// Takes the name, or the first free one of "device-1", "device-2", ... when it is empty, and makes the folder.

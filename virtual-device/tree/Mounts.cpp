@@ -3,12 +3,17 @@
 
 #include "virtual-device/tree/Mounts.h"
 
-#include <QFile>
+#include <QDir>
+#include <QFileInfo>
 #include <QProcess>
 
+#include <mntent.h>
 #include <sys/mount.h>
 
 #include <algorithm>
+#include <cstdio>
+#include <memory>
+#include <vector>
 
 namespace VirtualDevice
 {
@@ -16,34 +21,27 @@ namespace VirtualDevice
 namespace
 {
 
-/// The mount table writes blanks, tabs, line ends and backslashes as three octal digits.
-QString unescaped(const QByteArray& field)
+/// As the mount table names it. The last component stays as it is: a mount point whose server has died answers nothing.
+QString canonical(const QString& folder)
 {
-    QByteArray plain;
-    for (qsizetype index = 0; index < field.size(); ++index) {
-        if (field[index] != '\\') {
-            plain.append(field[index]);
-            continue;
-        }
-        plain.append(static_cast<char>(field.mid(index + 1, 3).toInt(nullptr, 8)));
-        index += 3;
-    }
-    return QString::fromLocal8Bit(plain);
+    const QFileInfo plain(QDir::cleanPath(folder));
+    const QString parent = QFileInfo(plain.absolutePath()).canonicalFilePath();
+    return parent.isEmpty() ? plain.absoluteFilePath() : QDir(parent).absoluteFilePath(plain.fileName());
 }
 
 } // namespace
 
 QStringList mountedBelow(const QString& folder)
 {
-    constexpr qsizetype mountPointField = 4;
+    constexpr std::size_t longestLine = 32 * 1024; // two paths, each with every byte escaped
     QStringList found;
-    QFile table(QStringLiteral("/proc/self/mountinfo"));
-    if (!table.open(QIODevice::ReadOnly))
-        return found;
-    const auto lines = table.readAll().split('\n');
-    for (const auto& line : lines) {
-        const QString mountPoint = unescaped(line.split(' ').value(mountPointField));
-        if (mountPoint == folder || mountPoint.startsWith(folder + u'/'))
+    const QString wanted = canonical(folder);
+    const std::unique_ptr<FILE, int (*)(FILE*)> table(::setmntent("/proc/self/mounts", "re"), ::endmntent);
+    std::vector<char> line(longestLine);
+    mntent entry{};
+    while (table && ::getmntent_r(table.get(), &entry, line.data(), static_cast<int>(line.size())) != nullptr) {
+        const QString mountPoint = QString::fromLocal8Bit(entry.mnt_dir);
+        if (mountPoint == wanted || mountPoint.startsWith(wanted + u'/'))
             found.append(mountPoint);
     }
     std::reverse(found.begin(), found.end());

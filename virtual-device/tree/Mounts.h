@@ -11,7 +11,7 @@ namespace VirtualDevice
 
 // Threads: any; the calls wait for the kernel, and for `fusermount3`.
 
-/// Mount points at or below `folder` in this process's mount namespace, deepest first.
+/// Mount points at or below `folder`, however that is spelt, in this process's mount namespace, deepest first.
 [[nodiscard]] QStringList mountedBelow(const QString& folder);
 
 /// Detaches one FUSE mount point, also one whose server is dead or that is in use. An ordinary user's goes through
