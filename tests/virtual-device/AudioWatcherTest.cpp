@@ -12,12 +12,18 @@
 #include <QSignalSpy>
 #include <QTemporaryDir>
 #include <QTest>
+#include <QThread>
 #include <QTimer>
 
 #include <fcntl.h>
 #include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <unistd.h>
+
+#include <array>
+#include <atomic>
+#include <ctime>
+#include <thread>
 
 using namespace std::chrono_literals;
 using namespace VirtualDevice;
@@ -75,6 +81,14 @@ class AudioWatcherTest : public QObject
         QFile file(wav());
         QVERIFY(file.open(QIODevice::WriteOnly | QIODevice::Truncate));
         QCOMPARE(file.write(content), content.size());
+    }
+
+    /// Both files may have been written within a tick of the kernel's.
+    void setNewDate() const
+    {
+        const timespec date{::time(nullptr) + 5, 0};
+        const std::array times{date, date};
+        QCOMPARE(::utimensat(AT_FDCWD, wav().toLocal8Bit().constData(), times.data(), 0), 0);
     }
 
     /// The sound as the audio library plays it: whole buffers, the last one filled up with zeros.
@@ -234,13 +248,52 @@ private slots:
         QByteArray other = testSound();
         other[100] = static_cast<char>(other[100] ^ 1);
         writeWav(other);
-        QFile file(wav()); // both may have been written within a tick of the kernel's
-        QVERIFY(file.open(QIODevice::ReadWrite));
-        QVERIFY(file.setFileTime(QDateTime::currentDateTime().addSecs(5), QFile::FileModificationTime));
+        setNewDate();
         samples = wavSamples(other);
         QVERIFY(program.write(played()));
         QTRY_COMPARE(number("audio.sounds"), 2);
         QCOMPARE(number("audio.mismatches"), 0);
+    }
+
+    void aSoundFileReplacedByAPipeHoldsNobodyUp()
+    {
+        const Writer program(stream());
+        QVERIFY(program.write(played() + silence));
+        QTRY_COMPARE(number("audio.buffers"), 5);
+        QVERIFY(QFile::remove(wav()));
+        QCOMPARE(::mkfifo(wav().toLocal8Bit().constData(), 0600), 0);
+        setNewDate();
+        // Frees whoever waits for a writer, so that the test ends in any case.
+        std::atomic<bool> somebodyWaited = false;
+        const std::jthread rescue([&somebodyWaited, path = wav().toLocal8Bit()](const std::stop_token& stop) {
+            for (int round = 0; round < 50 && !stop.stop_requested(); ++round)
+                QThread::msleep(100);
+            const int writer = stop.stop_requested() ? -1 : ::open(path.constData(), O_WRONLY | O_NONBLOCK | O_CLOEXEC);
+            somebodyWaited = writer >= 0;
+            ::close(writer);
+        });
+        QVERIFY(program.write(silence + played()));
+        QTRY_COMPARE(number("audio.buffers"), 10);
+        QVERIFY(!somebodyWaited);
+        QCOMPARE(number("audio.mismatches"), 4); // nothing is known that it could be
+        QVERIFY(QFile::remove(wav()));
+        writeWav(testSound());
+        QVERIFY(program.write(silence));
+        QTRY_COMPARE(number("audio.buffers"), 11);
+        QVERIFY(program.write(played()));
+        QTRY_COMPARE(number("audio.buffers"), 15);
+        QCOMPARE(number("audio.mismatches"), 4);
+    }
+
+    void aSoundFileOfEnormousLengthIsNotRead()
+    {
+        const Writer program(stream());
+        QFile file(wav());
+        QVERIFY(file.resize(65LL * 1024 * 1024)); // the sound first, then a hole
+        setNewDate();
+        QVERIFY(program.write(played()));
+        QTRY_COMPARE(number("audio.buffers"), 4);
+        QCOMPARE(number("audio.mismatches"), 4);
     }
 
     void aProgramThatEndsIsFollowedByTheNext()

@@ -10,6 +10,7 @@
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
+#include <QScopeGuard>
 #include <QSocketNotifier>
 
 #include <fcntl.h>
@@ -41,6 +42,24 @@ QByteArray mixerConfiguration()
     return QStringLiteral("ctl_type.immunityrig { lib \"%1\" }\nctl.default { type immunityrig state \"%2\" }\n")
         .arg(QLatin1String(AudioWatcher::visiblePlugin), visible("mixer"))
         .toUtf8();
+}
+
+/// What a file of that name holds; nothing where it is no ordinary file, such as a pipe, which must hold nobody up, or
+/// where it is longer than any sound.
+QByteArray contentOf(const QString& path)
+{
+    constexpr qint64 longestFile = 64 * 1024 * 1024;
+    const int descriptor = ::open(QFile::encodeName(path).constData(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (descriptor < 0)
+        return {};
+    const auto close = qScopeGuard([descriptor] { ::close(descriptor); });
+    struct stat status
+    {
+    };
+    if (::fstat(descriptor, &status) != 0 || !S_ISREG(status.st_mode) || status.st_size > longestFile)
+        return {};
+    QFile file;
+    return file.open(descriptor, QIODevice::ReadOnly) ? file.read(longestFile) : QByteArray();
 }
 
 } // namespace
@@ -189,8 +208,7 @@ void AudioWatcher::adoptSound()
     const QDateTime date = QFileInfo(soundFile).lastModified();
     if (date == soundDate)
         return;
-    QFile file(soundFile);
-    matcher.setSound(file.open(QIODevice::ReadOnly) ? wavSamples(file.readAll()) : QByteArray());
+    matcher.setSound(wavSamples(contentOf(soundFile)));
     soundDate = date;
 }
 
