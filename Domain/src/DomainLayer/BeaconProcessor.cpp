@@ -301,8 +301,10 @@ void BeaconProcessor::PrivateData::handlePingReply(const QByteArray& /*reply*/)
 BeaconProcessor::BeaconProcessor(SerialPort& serialPort) : data(std::make_unique<PrivateData>(*this, serialPort))
 {
     qRegisterMetaType<Error>("Domain::AbstractBeaconProcessor::Error");
-    moveToThread(&data->workerThread);
     data->workerThread.start(QThread::HighPriority);
+    // Where the machine has no thread left, everything happens on the caller's, as long as that runs its event loop.
+    if (data->workerThread.isRunning())
+        moveToThread(&data->workerThread);
     connect(this, SIGNAL(threadStarted()), this, SLOT(createObjectsOnThread()));
     emit threadStarted();
     // A command may follow at once, and needs the objects.
@@ -312,7 +314,7 @@ BeaconProcessor::BeaconProcessor(SerialPort& serialPort) : data(std::make_unique
 /// A timer can be stopped on its own thread only, and nothing may be destroyed while that thread still uses it.
 BeaconProcessor::~BeaconProcessor()
 {
-    QMetaObject::invokeMethod(this, "destroyObjectsOnThread", Qt::QueuedConnection);
+    QMetaObject::invokeMethod(this, "destroyObjectsOnThread", Qt::AutoConnection);
     data->objectsDestroyed.get_future().wait();
     data->workerThread.quit();
     data->workerThread.wait();

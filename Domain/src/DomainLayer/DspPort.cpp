@@ -222,7 +222,11 @@ bool DspPort::PrivateData::startReading()
     keepRunning = true;
     readLoopFinished = false;
     readThread.start(QThread::HighPriority);
-    return true;
+    if (readThread.isRunning())
+        return true;
+    // The machine has no thread left: nobody will ever end the loop.
+    readLoopFinished = true;
+    return false;
 }
 
 void DspPort::close()
