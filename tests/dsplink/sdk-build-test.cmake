@@ -2,8 +2,9 @@
 # SPDX-License-Identifier: MIT
 
 # cmake -DSOURCE=folder -DWORK=folder -DGENERATOR=name -DCOMPILER=path -P sdk-build-test.cmake
-# Configures the program, as for the device, with a tree that has the shape of the chip maker's SDK, and compiles what uses its headers.
-# That alone: there is nothing to link with, and on a 64-bit machine words of type "long" have the wrong size.
+# Configures the program, as for the device, with a tree that has the shape of the chip maker's SDK, and compiles what
+# uses its headers. That alone: there is nothing to link with, and on a 64-bit machine words of type "long" have the
+# wrong size.
 function(run)
   execute_process(COMMAND ${ARGN} OUTPUT_VARIABLE output ERROR_VARIABLE output RESULT_VARIABLE result)
   if(NOT result EQUAL 0)
