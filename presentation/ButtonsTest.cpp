@@ -91,7 +91,7 @@ void ButtonsTest::keyPressEvent(QKeyEvent* event)
         qDebug("%s pressed", key->name);
         auto& label = *((*ui).*(key->label));
         if (WidgetUpdates::showStyle(label, pressedStyleSheet))
-            label.repaint();
+            WidgetUpdates::showNow(label);
     }
     emit(this->*key->pressed)();
     if (key->code == Qt::Key_F12)

@@ -174,7 +174,7 @@ void RfTest::toggleState()
     d->stopPacket();
     d->send(&AbstractBeaconProcessor::setPowerAmpEnable, false);
     d->ui.labelTransmitting->setText(QStringLiteral("| X"));
-    d->ui.labelTransmitting->repaint(); // The wait keeps the event loop from painting it.
+    WidgetUpdates::showNow(*d->ui.labelTransmitting); // The wait keeps the event loop from doing it.
     d->wait();
 }
 

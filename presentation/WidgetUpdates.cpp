@@ -3,8 +3,10 @@
 
 #include "presentation/WidgetUpdates.h"
 
+#include <QCoreApplication>
 #include <QDateTimeEdit>
 #include <QDoubleSpinBox>
+#include <QEvent>
 #include <QWidget>
 
 #include <algorithm>
@@ -34,6 +36,15 @@ void showDateTime(QDateTimeEdit& edit, const QDateTime& dateTime)
     const auto shown = std::clamp(dateTime, edit.minimumDateTime(), edit.maximumDateTime());
     if (edit.dateTime() != shown)
         edit.setDateTime(shown);
+}
+
+void showNow(QWidget& widget)
+{
+    widget.repaint();
+    // The platform's copy to its screen first; what a VNC server posts for its viewers thereby is left to a second
+    // pass.
+    for (int pass = 0; pass < 2; ++pass)
+        QCoreApplication::sendPostedEvents(nullptr, QEvent::UpdateRequest);
 }
 
 } // namespace Presentation::WidgetUpdates

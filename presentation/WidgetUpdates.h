@@ -23,4 +23,11 @@ void showNumber(QDoubleSpinBox& box, double value);
 /// An invalid date and time leaves what is shown.
 void showDateTime(QDateTimeEdit& edit, const QDateTime& dateTime);
 
+/// Brings the widget to the screen at once, for a caller that is about to hold the GUI thread. Painting alone reaches
+/// the window's buffer: the framebuffer and the VNC platform note that it has changed and copy it to the screen, or
+/// send it, by requests to update that wait for the event loop. Such requests are handled here, and no other event.
+/// A viewer over VNC asks for a next picture with each that it gets; one whose question is still under way when the
+/// thread is held gets the picture after that.
+void showNow(QWidget& widget);
+
 } // namespace Presentation::WidgetUpdates

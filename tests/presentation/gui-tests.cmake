@@ -12,7 +12,7 @@ target_precompile_headers(PresentationTestSupport REUSE_FROM TestSupport)
 
 foreach(test IN ITEMS
     RtcTestTest FuelGuageTestTest UsbDeviceTestTest UsbGadgetTestTest SdCardTestTest TriggerTestTest ButtonsTestTest
-    RfTestTest RfLinkTest TerminationSignalsTest)
+    RfTestTest RfLinkTest TerminationSignalsTest ScreenUpdatesTest)
   immunityrig_test(${test} SOURCES presentation/${test}.cpp LIBRARIES PresentationTestSupport Presentation LABELS presentation)
 endforeach()
 immunityrig_test(TestGuiTest SOURCES presentation/TestGuiTest.cpp
