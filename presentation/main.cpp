@@ -5,6 +5,7 @@
 #include "presentation/TerminationSignals.h"
 #include "presentation/TestGui.h"
 #include "utilities/Debug.h"
+#include "utilities/StandardError.h"
 
 #include <QApplication>
 #include <QFont>
@@ -19,6 +20,8 @@ void prepareProcess()
 {
     // Nobody reading standard error any more must not end the run.
     std::signal(SIGPIPE, SIG_IGN);
+    // Nor must somebody who is there and reads nothing stop it.
+    Utilities::StandardError::keepFromBlocking();
     // The device's Qt configuration moves the prefix to /usr/share, where there are no plugins: the ones of the Qt that
     // the program was built with serve.
     QCoreApplication::addLibraryPath(QStringLiteral(IMMUNITYRIG_QT_PLUGINS));

@@ -3,7 +3,9 @@
 
 #include "utilities/LogWriter.h"
 
+#include <poll.h>
 #include <syslog.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <csignal>
@@ -24,6 +26,24 @@ void callSyslog(int priority, const char* format)
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
     syslog(priority, format); // NOLINT(cppcoreguidelines-pro-type-vararg)
 #pragma GCC diagnostic pop
+}
+
+/// As a blocking write would, where the descriptor itself does not block (`StandardError`).
+void awaitStandardError()
+{
+    pollfd descriptor{STDERR_FILENO, POLLOUT, 0};
+    ::poll(&descriptor, 1, -1);
+}
+
+void writeToStandardError(const QByteArray& bytes)
+{
+    for (qsizetype done = 0; done < bytes.size();) {
+        awaitStandardError();
+        const auto written = ::write(STDERR_FILENO, bytes.constData() + done, static_cast<size_t>(bytes.size() - done));
+        if (written < 0 && errno != EINTR && errno != EAGAIN)
+            return;
+        done += written < 0 ? 0 : written;
+    }
 }
 
 /// Signals are the business of the threads that expect them: the writer's thread takes none.
@@ -73,9 +93,15 @@ void LogWriter::close()
 void LogWriter::write(int priority, const QByteArray& format)
 {
     submit([priority, format, error = errno] {
+        awaitStandardError(); // for the echo
         errno = error;
         callSyslog(priority, format.constData());
     });
+}
+
+void LogWriter::writeError(const QByteArray& bytes)
+{
+    submit([bytes] { writeToStandardError(bytes); });
 }
 
 void LogWriter::submit(Request request)
@@ -86,8 +112,10 @@ void LogWriter::submit(Request request)
     queue.push_back(std::move(request));
     const auto ticket = ++submitted;
     changed.notify_all();
-    if (!hanging && !waitFor(lock, ticket))
-        hanging = true;
+    if (hanging || waitFor(lock, ticket))
+        return;
+    hanging = true;
+    changed.notify_all(); // Whoever else waits need not find out for himself.
 }
 
 bool LogWriter::waitFor(std::unique_lock<std::mutex>& lock, std::uint64_t ticket)
@@ -105,12 +133,25 @@ void LogWriter::run()
         const Request request = std::move(queue.front());
         queue.pop_front();
         lock.unlock();
+        const auto begin = std::chrono::steady_clock::now();
         request();
+        const auto end = std::chrono::steady_clock::now();
         lock.lock();
         ++completed;
-        hanging = false;
+        judgeBy(end - begin);
         changed.notify_all();
     }
+}
+
+/// A service that moves, but slowly, costs the callers as much as one that hangs: those of a noisy line, with a message
+/// for every byte, and with them everybody who queues up behind them.
+void LogWriter::judgeBy(std::chrono::nanoseconds lastRequest)
+{
+    slowness = lastRequest < quick ? std::chrono::nanoseconds(0) : slowness + lastRequest;
+    if (slowness >= patience)
+        hanging = true;
+    else if (slowness.count() == 0 && lastRequest * queue.size() < patience / 4)
+        hanging = false;
 }
 
 void LogWriter::finish()

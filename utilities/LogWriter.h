@@ -16,11 +16,13 @@
 namespace Utilities
 {
 
-/// Carries log messages to `syslog` on a thread of its own, so that a log service which takes nothing blocks that
-/// thread and nobody else.
+/// Carries log messages to `syslog`, and other lines to standard error, on a thread of its own, so that a reader which
+/// takes nothing blocks that thread and nobody else.
 ///
 /// Threads: every operation may be called from any thread. Each waits until its request has been carried out, but all
-/// callers together wait at most `patience` for a service that hangs; until the service moves again nobody waits.
+/// callers together wait at most `patience` for a service that hangs, or that is slow (`quick` or longer for each of
+/// many requests in a row). From then on nobody waits, until the service is quick again and what is still queued is a
+/// matter of a moment.
 /// The queue holds `capacity` requests; a request that finds it full is dropped.
 /// At the end of the process the writer waits `patience` for what is still queued; what is logged after that, by
 /// objects with static storage duration, is dropped: `syslog` itself might block the exit. A service that hangs even
@@ -30,6 +32,7 @@ class LogWriter
 public:
     static constexpr std::size_t capacity = 1000;
     static constexpr std::chrono::milliseconds patience{250};
+    static constexpr std::chrono::milliseconds quick{10};
 
     static LogWriter& instance();
 
@@ -41,6 +44,8 @@ public:
     void close();
     /// `format` is the format of the `syslog` call; `%m` shows the caller's `errno`.
     void write(int priority, const QByteArray& format);
+    /// Writes the bytes to standard error as they are. Without a reader they are lost.
+    void writeError(const QByteArray& bytes);
 
 private:
     using Request = std::function<void()>;
@@ -51,6 +56,7 @@ private:
     void submit(Request request);
     void run();
     void finish();
+    void judgeBy(std::chrono::nanoseconds lastRequest);
     [[nodiscard]] bool waitFor(std::unique_lock<std::mutex>& lock, std::uint64_t ticket);
 
     std::mutex mutex;
@@ -58,6 +64,7 @@ private:
     std::deque<Request> queue;
     std::uint64_t submitted = 0;
     std::uint64_t completed = 0;
+    std::chrono::nanoseconds slowness{0}; ///< what the last requests took, as far as they were slow one after another
     bool hanging = false;
     bool finishing = false;
     std::thread thread;

@@ -51,6 +51,12 @@ public:
         waitForFinished();
     }
 
+    /// Standard error is this descriptor instead.
+    void setErrors(int descriptor)
+    {
+        setChildProcessModifier([descriptor] { ::dup2(descriptor, STDERR_FILENO); });
+    }
+
     /// With a plugin of the test inside it.
     void startWithScreenProbe()
     {
@@ -90,6 +96,32 @@ public:
         }
         return false;
     }
+};
+
+/// A pipe that takes not a byte more, and whose reader is there and reads nothing.
+class FullPipe
+{
+public:
+    FullPipe()
+    {
+        if (::pipe2(ends, O_CLOEXEC | O_NONBLOCK) != 0)
+            qFatal("no pipe");
+        while (::write(ends[1], "x", 1) == 1) {
+        }
+        ::fcntl(ends[1], F_SETFL, 0);
+    }
+    ~FullPipe()
+    {
+        ::close(ends[0]);
+        ::close(ends[1]);
+    }
+    FullPipe(const FullPipe&) = delete;
+    FullPipe& operator=(const FullPipe&) = delete;
+
+    [[nodiscard]] int input() const { return ends[1]; }
+
+private:
+    int ends[2] = {-1, -1};
 };
 
 /// The card's check ran again: it wrote the probe file that has just been removed.
@@ -286,6 +318,20 @@ private slots:
         for (int second = 0; second < 3; ++second)
             QVERIFY(pollsAgain());
         QCOMPARE(program.state(), QProcess::Running);
+    }
+
+    /// Neither the clock's messages nor the keys' and the gauge's may wait for a reader who never comes.
+    void goesOnWhenItsErrorsFillThePipe()
+    {
+        const FullPipe pipe;
+        Program program;
+        program.setErrors(pipe.input());
+        program.start();
+        for (int second = 0; second < 3; ++second)
+            QVERIFY(pollsAgain());
+        QCOMPARE(program.state(), QProcess::Running);
+        program.signal(SIGTERM);
+        QVERIFY(program.endsOrderly());
     }
 
     void goesOnWithoutALogService()

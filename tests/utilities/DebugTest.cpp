@@ -17,11 +17,64 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
+#include <chrono>
 #include <thread>
 
 using TestSupport::LogCapture;
 using Utilities::Debug;
+
+namespace
+{
+
+/// A log service that takes its time over each message, or takes none as long as `hangs` is set.
+class SlowService
+{
+public:
+    std::atomic<bool> hangs{false};
+    std::atomic<int> taken{0};
+
+    explicit SlowService(std::chrono::milliseconds each) : pause(each)
+    {
+        sockaddr_un address{};
+        address.sun_family = AF_UNIX;
+        qstrncpy(address.sun_path, "/dev/log", sizeof address.sun_path);
+        if (::bind(socket, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0)
+            qFatal("no /dev/log");
+        thread = std::thread([this] { serve(); });
+        Debug::open();
+    }
+    ~SlowService()
+    {
+        ending = true;
+        thread.join();
+        ::close(socket);
+        ::unlink("/dev/log");
+    }
+    SlowService(const SlowService&) = delete;
+    SlowService& operator=(const SlowService&) = delete;
+
+    void hurry() { pause = std::chrono::milliseconds(0); }
+
+private:
+    void serve()
+    {
+        char message[256];
+        while (!ending) {
+            if (!hangs && ::recv(socket, message, sizeof message, MSG_DONTWAIT) > 0)
+                ++taken;
+            std::this_thread::sleep_for(pause.load());
+        }
+    }
+
+    const int socket = ::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0);
+    std::atomic<std::chrono::milliseconds> pause;
+    std::atomic<bool> ending{false};
+    std::thread thread;
+};
+
+} // namespace
 
 class DebugTest : public QObject
 {
@@ -49,6 +102,8 @@ private slots:
     void everyMessageIsEchoedOnStandardErrorBeforeItsCallReturns();
     void withoutALogServiceMessagesGoToTheConsole();
     void aServiceThatTakesNothingHoldsNobodyUp();
+    void aSlowServiceHoldsNobodyUp();
+    void aBacklogThatASlowServiceWorksOffHoldsNobodyUp();
 };
 
 void DebugTest::everyOperationHasItsPriority_data()
@@ -281,6 +336,40 @@ void DebugTest::aServiceThatTakesNothingHoldsNobodyUp()
             return log.count("back again") > 0;
         },
         20000));
+}
+
+/// Callers who waited for each of their messages would have it taken when they are through.
+void DebugTest::aSlowServiceHoldsNobodyUp()
+{
+    constexpr int far = 9 * static_cast<int>(Utilities::LogWriter::capacity) / 10;
+    SlowService service(2 * Utilities::LogWriter::quick);
+    for (int message = 0; message < far; ++message)
+        Debug::info("one of many");
+    QVERIFY2(service.taken < far * 2 / 3, qPrintable(QString::number(service.taken)));
+    // The queue has room for them all.
+    service.hurry();
+    QTRY_COMPARE_WITH_TIMEOUT(service.taken.load(), far, 20'000);
+}
+
+/// A service that was away for a moment, and then is not slow, but has a second's messages to work off: who waited for
+/// a place behind them would wait for the whole patience, each time.
+void DebugTest::aBacklogThatASlowServiceWorksOffHoldsNobodyUp()
+{
+    constexpr int far = static_cast<int>(Utilities::LogWriter::capacity) / 2;
+    constexpr int more = 20;
+    SlowService service(Utilities::LogWriter::quick * 3 / 5);
+    service.hangs = true;
+    for (int message = 0; message < far; ++message)
+        Debug::info("one of many");
+    service.hangs = false;
+    for (int message = 0; message < more; ++message) {
+        const int before = service.taken;
+        QTRY_VERIFY_WITH_TIMEOUT(service.taken > before, 20'000);
+        Debug::info("one behind them");
+    }
+    QVERIFY2(service.taken < far, qPrintable(QString::number(service.taken)));
+    service.hurry();
+    QTRY_COMPARE_WITH_TIMEOUT(service.taken.load(), far + more, 20'000);
 }
 
 QTEST_GUILESS_MAIN(DebugTest)
