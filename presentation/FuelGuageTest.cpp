@@ -20,6 +20,8 @@ namespace
 const QString voltageFilename = QStringLiteral("sys/class/power_supply/ds2780-battery.0/voltage_now");
 const QString currentFilename = QStringLiteral("sys/class/power_supply/ds2780-battery.0/current_now");
 constexpr int pollIntervalMs = 1000;
+/// Far more than the kernel ever gives, a page. A line that is longer still is no number, whatever it begins with.
+constexpr qint64 longestLine = 1 << 20;
 constexpr double microvoltsPerVolt = 1'000'000;
 constexpr double microamperesPerMilliampere = 1000;
 
@@ -28,9 +30,9 @@ std::optional<int> reading(QFile& file)
 {
     if (!file.open(QIODevice::ReadOnly))
         return std::nullopt;
-    const int value = QString::fromLatin1(file.readLine()).toInt();
+    const QByteArray line = file.readLine(longestLine + 1);
     file.close();
-    return value;
+    return line.size() < longestLine ? QString::fromLatin1(line).toInt() : 0;
 }
 
 } // namespace

@@ -20,13 +20,16 @@ const QString connectedText = QStringLiteral("b_peripheral");
 const QString disconnectedStyleSheet = QStringLiteral("background-color: red;");
 const QString connectedStyleSheet = QStringLiteral("background-color: green;");
 constexpr int pollIntervalMs = 1000;
+/// A longer line is another mode, however it goes on: the text, the character that is dropped, one more, and one
+/// for the end that `readLine` counts in.
+const qint64 longestMode = connectedText.size() + 1 + 1 + 1;
 
 /// What the file holds now, without its last character, the line end; empty when the file is closed or unreadable.
 QString currentMode(QFile& file)
 {
     if (!file.isOpen() || !file.seek(0))
         return {};
-    QString line = QString::fromLatin1(file.readLine());
+    QString line = QString::fromLatin1(file.readLine(longestMode));
     line.chop(1);
     return line;
 }

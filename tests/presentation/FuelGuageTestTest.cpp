@@ -114,6 +114,12 @@ private slots:
         row("numbers beyond the fields' ranges", "2000000000\n", "-2000000000\n", "99.990000", "-9999.9900");
         row("a negative voltage", "-1\n", "2000000000\n", "0.000000", "9999.9900");
         row("noise", QByteArray("\0\xff\x80\x01%n\n", 7), QByteArray(4096, '\xff'), "0.000000", "0.0000");
+        row("numbers among many blanks", QByteArray(1 << 16, ' ') + "4100000\n", "-5000" + QByteArray(1 << 16, ' '),
+            "4.100000", "-5.0000");
+        row("numbers with many zeros", QByteArray(1 << 16, '0') + "4100000\n", "-" + QByteArray(1 << 16, '0') + "5000",
+            "4.100000", "-5.0000");
+        row("a number before a megabyte of blanks and noise", "4100000" + QByteArray(1 << 20, ' ') + 'x', "5000\n",
+            "0.000000", "5.0000");
         row("a megabyte of digits", QByteArray(1 << 20, '7'), QByteArray(1 << 20, '\0'), "0.000000", "0.0000");
     }
 
@@ -134,6 +140,18 @@ private slots:
         QCOMPARE(output.complaints(), QStringList());
         for (const auto* const box : test.findChildren<QDoubleSpinBox*>())
             QCOMPARE(box->styleSheet(), QString());
+    }
+
+    void noLineIsReadWithoutEnd()
+    {
+        TestSupport::writeEndlessLine(voltageFile, "4100000");
+        TestSupport::writeEndlessLine(currentFile, "-123456");
+        FuelGuageTest test(nullptr);
+        const qint64 before = TestSupport::bytesRead();
+        test.start();
+        QVERIFY(TestSupport::bytesRead() - before < TestSupport::mostRead);
+        QCOMPARE(voltageText(test), QStringLiteral("Voltage = 0.000000 V"));
+        QCOMPARE(currentText(test), QStringLiteral("Current = 0.0000 mA"));
     }
 
     void numbersLookTheSameInEveryCountry()

@@ -122,6 +122,9 @@ private slots:
         QTest::newRow("that is shorter") << probeText.chopped(1) << false;
         QTest::newRow("that is empty") << QByteArray() << false;
         QTest::newRow("of noise") << QByteArray("\xff\0%n\x80", 5) << false;
+        QTest::newRow("after a byte order mark") << "\xef\xbb\xbf" + probeText << true;
+        QTest::newRow("that is longer after a byte order mark") << "\xef\xbb\xbf" + probeText + '.' << false;
+        QTest::newRow("with a megabyte behind it") << probeText + QByteArray(1 << 20, '\0') << false;
         QTest::newRow("of a megabyte") << QByteArray(1 << 20, 'V') << false;
     }
 
@@ -135,6 +138,16 @@ private slots:
         test.start();
         QCOMPARE(style(test), isGreen ? green : red);
         QCOMPARE(readFile(probeFile), content);
+    }
+
+    void noMoreIsReadOfALineThanDecides()
+    {
+        TestSupport::writeEndlessLine(probeFile, probeText);
+        SdCardTest test(nullptr);
+        const qint64 before = TestSupport::bytesRead();
+        test.start();
+        QVERIFY(TestSupport::bytesRead() - before < TestSupport::mostRead);
+        QCOMPARE(style(test), red);
     }
 
     void aReadOnlyPartitionWithoutTheProbeFileStaysRed()

@@ -64,6 +64,7 @@ private slots:
         QTest::newRow("empty") << QByteArray() << false;
         QTest::newRow("an empty line") << QByteArray("\n") << false;
         QTest::newRow("noise") << QByteArray("\0\xff%n\x80\n", 6) << false;
+        QTest::newRow("longer by two characters") << QByteArray("b_peripheral!\n") << false;
         QTest::newRow("a megabyte") << QByteArray(1 << 20, 'b') << false;
         QTest::newRow("the mode and a megabyte after it") << "b_peripheral\n" + QByteArray(1 << 20, 'b') << true;
     }
@@ -79,6 +80,16 @@ private slots:
         QCOMPARE(child<QLabel>(test, "connectLabel").styleSheet(), isGreen ? green : red);
         QCOMPARE(output.texts(), QStringList());
         QCOMPARE(output.complaints(), QStringList());
+    }
+
+    void noMoreIsReadOfALineThanDecides()
+    {
+        TestSupport::writeEndlessLine(mode, "b_peripheral");
+        UsbGadgetTest test(nullptr);
+        const qint64 before = TestSupport::bytesRead();
+        test.start();
+        QVERIFY(TestSupport::bytesRead() - before < TestSupport::mostRead);
+        QCOMPARE(child<QLabel>(test, "connectLabel").styleSheet(), red);
     }
 
     void theOpenFileIsReadAnewEverySecond()

@@ -15,6 +15,13 @@
 namespace TestSupport
 {
 
+namespace
+{
+
+constexpr qint64 endlessSize = 8 << 20;
+
+} // namespace
+
 TimerProbe::TimerProbe()
 {
     QCoreApplication::instance()->installEventFilter(this);
@@ -86,6 +93,21 @@ QByteArray readFile(const QString& path)
 {
     QFile file(path);
     return file.open(QIODevice::ReadOnly) ? file.readAll() : QByteArray("(no file)");
+}
+
+qint64 bytesRead()
+{
+    QFile counters(QStringLiteral("/proc/self/io"));
+    if (!counters.open(QIODevice::ReadOnly))
+        qFatal("no counters");
+    return counters.readLine().split(' ').last().trimmed().toLongLong(); // "rchar: N"
+}
+
+void writeEndlessLine(const QString& path, const QByteArray& begin)
+{
+    writeFile(path, begin);
+    if (!QFile::resize(path, endlessSize))
+        qFatal("cannot enlarge %s", qPrintable(path));
 }
 
 void removePath(const QString& path)

@@ -70,6 +70,11 @@ template <typename Type> Type& child(QObject& parent, const char* name)
 /// Writes a file of the sandbox, with the folders above it. The file is kept in place: only its content changes.
 void writeFile(const QString& path, const QByteArray& content);
 [[nodiscard]] QByteArray readFile(const QString& path);
+/// How many bytes this process has read so far, from whatever.
+[[nodiscard]] qint64 bytesRead();
+/// A file of eight megabytes without a line end: larger than what any region may read at a time.
+void writeEndlessLine(const QString& path, const QByteArray& begin);
+inline constexpr qint64 mostRead = 5 << 20;
 /// Removes a file, a link or a folder with everything in it.
 void removePath(const QString& path);
 
