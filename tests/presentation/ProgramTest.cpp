@@ -5,9 +5,11 @@
 #include "tests/support/LogCapture.h"
 
 #include <QProcess>
+#include <QTemporaryDir>
 #include <QTest>
 
 #include <fcntl.h>
+#include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <syslog.h>
 #include <unistd.h>
@@ -64,6 +66,21 @@ public:
         environment.insert(QStringLiteral("QT_PLUGIN_PATH"),
                            qEnvironmentVariable("IMMUNITYRIG_BUILD") + QStringLiteral("/tests/plugins"));
         environment.insert(QStringLiteral("QT_QPA_GENERIC_PLUGINS"), QStringLiteral("screenprobe"));
+        setProcessEnvironment(environment);
+        start();
+    }
+
+    /// With a sound card that gives its samples to a file.
+    void startWithSoundCard(const QTemporaryDir& folder, const QString& samples)
+    {
+        QFile file(folder.filePath(QStringLiteral("asound.conf")));
+        QVERIFY(file.open(QIODevice::WriteOnly));
+        file.write("pcm.default { type plug slave.pcm { type file slave.pcm { type null } format raw file \"" +
+                   samples.toUtf8() + "\" } }\n");
+        file.close();
+        auto environment = processEnvironment();
+        environment.insert(QStringLiteral("SDL_AUDIODRIVER"), QStringLiteral("alsa"));
+        environment.insert(QStringLiteral("ALSA_CONFIG_PATH"), file.fileName());
         setProcessEnvironment(environment);
         start();
     }
@@ -275,6 +292,28 @@ private slots:
         QVERIFY(pollsAgain());
         program.signal(number);
         QVERIFY(program.endsOrderly());
+    }
+
+    /// A sound card that has died in the middle of a buffer: here a pipe that nobody reads.
+    void endsOrderlyWhenTheSoundCardTakesNoSamples()
+    {
+        const QTemporaryDir folder;
+        const QString samples = folder.filePath(QStringLiteral("samples"));
+        QCOMPARE(::mkfifo(qPrintable(samples), 0600), 0);
+        const int card = ::open(qPrintable(samples), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+        const int capacity = ::fcntl(card, F_GETPIPE_SZ);
+        const auto isFull = [&] {
+            int waiting = 0;
+            return ::ioctl(card, FIONREAD, &waiting) == 0 && waiting == capacity;
+        };
+        Program program;
+        program.startWithSoundCard(folder, samples);
+        QVERIFY(QTest::qWaitFor(isFull, patienceMs));
+        QVERIFY(pollsAgain());
+        program.signal(SIGTERM);
+        QVERIFY(program.endsOrderly());
+        QVERIFY(isFull());
+        ::close(card);
     }
 
     /// The gauge holds the event loop, which the first signal would end.
