@@ -8,10 +8,12 @@
 #include "virtual-device/registry/ControlTable.h"
 #include "virtual-device/screen/RegionMap.h"
 
+#include <QFile>
 #include <QJsonArray>
 #include <QJsonDocument>
 #include <QLocalSocket>
 #include <QRandomGenerator>
+#include <QRegularExpression>
 #include <QSignalSpy>
 #include <QTest>
 #include <QTimer>
@@ -112,6 +114,7 @@ private slots:
     void logRefusesAMarkThatIsNone();
     void keysAndPicturesNeedAProgram();
     void clientReportsALostConnection();
+    void documentNamesEveryMethodAndParameter();
 
     void lineSplitterCutsAnyPieces();
 
@@ -461,6 +464,31 @@ void ControlServerTest::clientReportsALostConnection()
     QCOMPARE(reply.code, ControlClient::connectionLost);
     QVERIFY(!client->isOpen());
     QCOMPARE(client->call("list").code, ControlClient::connectionLost);
+}
+
+/// What the server itself says that it takes.
+void ControlServerTest::documentNamesEveryMethodAndParameter()
+{
+    QFile file(SOURCE_FOLDER "/docs/virtual-device.md");
+    QVERIFY(file.open(QIODevice::ReadOnly));
+    const QString page = QString::fromUtf8(file.readAll()).section("## The control socket", 1).section("\n## ", 0, 0);
+    QStringList documented;
+    static const QRegularExpression row("^\\| `([a-z]+)` \\|([^|]*)\\|[^|]*\\|$", QRegularExpression::MultilineOption);
+    static const QRegularExpression parameter("`([a-z]+)`");
+    RawClient raw(bench->socketPath());
+    for (const auto& match : row.globalMatch(page)) {
+        QStringList parameters;
+        for (const auto& name : parameter.globalMatch(match.captured(2)))
+            parameters.append(name.captured(1));
+        parameters.removeDuplicates();
+        const auto refused = raw.ask(R"({"jsonrpc":"2.0","id":1,"method":")" + match.captured(1).toUtf8() +
+                                     R"(","params":{"bogus":1}})");
+        QCOMPARE(errorText(refused), "unknown parameter \"bogus\"; allowed: " +
+                                         (parameters.isEmpty() ? QString("none") : parameters.join(", ")));
+        documented.append(match.captured(1));
+    }
+    QCOMPARE(errorText(raw.ask(R"({"jsonrpc":"2.0","id":1,"method":"bogus"})")),
+             "unknown method \"bogus\"; methods: " + documented.join(", "));
 }
 
 void ControlServerTest::lineSplitterCutsAnyPieces()

@@ -25,6 +25,7 @@ foreach(test ControlServerTest ControlWaitTest)
     SOURCES virtual-device/${test}.cpp virtual-device/ControlBench.cpp virtual-device/ControlBench.h
     LIBRARIES VirtualDevice LABELS unit)
 endforeach()
+target_compile_definitions(ControlServerTest PRIVATE SOURCE_FOLDER="${PROJECT_SOURCE_DIR}")
 immunityrig_test(RegionMapTest SOURCES virtual-device/RegionMapTest.cpp LIBRARIES VirtualDevice LABELS unit)
 set_target_properties(RegionMapTest PROPERTIES AUTOUIC_SEARCH_PATHS "${PROJECT_SOURCE_DIR}")
 immunityrig_test(CtlTest

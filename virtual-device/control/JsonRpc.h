@@ -18,7 +18,7 @@ namespace VirtualDevice::JsonRpc
 /// | code   | meaning                                                        |
 /// |--------|----------------------------------------------------------------|
 /// | -32700 | the line is no JSON                                            |
-/// | -32600 | it is JSON, but no request                                     |
+/// | -32600 | it is JSON, but no request, or longer than a line may be       |
 /// | -32601 | no such method; the text names those that there are            |
 /// | -32602 | a parameter is missing, unknown or out of range; the text says |
 /// | -32000 | a wait that did not come true in its time                      |
