@@ -3,7 +3,10 @@
 
 #include "tests/virtual-device/ControlBench.h"
 #include "virtual-device/control/CtlParser.h"
+#include "virtual-device/registry/ControlTable.h"
+#include "virtual-device/registry/Values.h"
 #include "virtual-device/sandbox/DeviceFolder.h"
+#include "virtual-device/screen/KeyTable.h"
 #include "virtual-device/screen/RegionMap.h"
 
 #include <QDir>
@@ -231,6 +234,12 @@ void CtlTest::helpIsNoError()
     const auto result = Ctl({"--help"}, "/nowhere").finish();
     QCOMPARE(result.status, 0);
     QVERIFY(result.output.startsWith("usage: virtual-device ctl "));
+    for (const auto& key : KeyTable::names())
+        QVERIFY2(result.output.contains(key), qPrintable(key));
+    for (const auto& region : RegionMap::names())
+        QVERIFY2(result.output.contains("\n    " + region + ' '), qPrintable(region));
+    for (const auto& spec : controlTable())
+        QVERIFY2(result.output.contains("\n    " + fromView(spec.name) + ' '), spec.name.data());
     QCOMPARE(Ctl({}, "/nowhere").finish().status, 2);
 }
 

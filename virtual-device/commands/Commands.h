@@ -20,7 +20,7 @@ inline constexpr int wrongUse = 2;
 /// QCoreApplication.
 using Subcommand = int (*)(const QStringList& arguments);
 
-/// Starts a device and the program in it; ends with the program, on SIGINT or on SIGTERM.
+/// Starts a device and the program in it; ends with the program, on SIGINT, SIGTERM or SIGHUP.
 [[nodiscard]] int runCommand(const QStringList& arguments);
 /// Starts a device and runs a command of the caller's in the program's place; returns the command's exit status.
 [[nodiscard]] int execCommand(const QStringList& arguments);

@@ -6,6 +6,7 @@
 #include "virtual-device/registry/ControlTable.h"
 #include "virtual-device/registry/Registry.h"
 #include "virtual-device/registry/Values.h"
+#include "virtual-device/screen/RegionMap.h"
 
 #include <QCommandLineParser>
 #include <QJsonArray>
@@ -33,9 +34,12 @@ QString groupOf(const ControlSpec& spec)
     return fromView(spec.name).section(u'.', 0, 0);
 }
 
-QString takes(const ControlSpec& spec)
+/// What the control is when the device starts.
+QString startOf(const ControlSpec& spec)
 {
-    return spec.access == ControlAccess::Device ? QStringLiteral("read only") : Registry::allowed(spec);
+    if (!spec.start.empty())
+        return fromView(spec.start);
+    return spec.initial.empty() ? QStringLiteral("empty") : fromView(spec.initial);
 }
 
 QString escapedForTable(QString text)
@@ -43,20 +47,31 @@ QString escapedForTable(QString text)
     return text.replace(u'|', QStringLiteral("\\|"));
 }
 
-/// Roff takes a leading dot or apostrophe for a request and a backslash for an escape.
-QString escapedForManual(QString text)
-{
-    text.replace(u'\\', QStringLiteral("\\e"));
-    return text.startsWith(u'.') || text.startsWith(u'\'') ? QStringLiteral("\\&") + text : text;
-}
-
 QString markdownRow(const ControlSpec& spec)
 {
-    const QString initial = fromView(spec.initial);
+    const bool isConstant = spec.start.empty() && !spec.initial.empty();
+    const QString start = escapedForTable(startOf(spec));
     return QStringLiteral("| `%1` | %2 | %3 | %4 |\n")
-        .arg(fromView(spec.name), escapedForTable(takes(spec)),
-             initial.isEmpty() ? QString() : QStringLiteral("`%1`").arg(escapedForTable(initial)),
-             escapedForTable(fromView(spec.help)));
+        .arg(fromView(spec.name), escapedForTable(ControlDescription::takes(spec)),
+             isConstant ? QStringLiteral("`%1`").arg(start) : start, escapedForTable(fromView(spec.help)));
+}
+
+QString regionTable()
+{
+    QString table = QStringLiteral("\n## Regions of the window\n\n"
+                                   "`virtual-device ctl regions` shows the colour of each region, `virtual-device ctl "
+                                   "wait region NAME COLOUR` waits for one. Colours: %1.\n\n"
+                                   "| region | x, y, width, height | what is there |\n|---|---|---|\n")
+                        .arg(RegionMap::words().join(QStringLiteral(", ")));
+    for (const auto& region : RegionMap::regions())
+        table += QStringLiteral("| `%1` | %2, %3, %4, %5 | %6 |\n")
+                     .arg(fromView(region.name))
+                     .arg(region.x)
+                     .arg(region.y)
+                     .arg(region.width)
+                     .arg(region.height)
+                     .arg(fromView(region.help));
+    return table;
 }
 
 QString json()
@@ -68,6 +83,13 @@ QString json()
 }
 
 } // namespace
+
+QString ControlDescription::takes(const ControlSpec& spec)
+{
+    if (spec.access == ControlAccess::Operator)
+        return Registry::allowed(spec);
+    return spec.unit.empty() ? QStringLiteral("read only") : QStringLiteral("read only, %1").arg(fromView(spec.unit));
+}
 
 QJsonObject ControlDescription::object(const ControlSpec& spec)
 {
@@ -89,11 +111,13 @@ QJsonObject ControlDescription::object(const ControlSpec& spec)
 
 QString ControlDescription::markdown()
 {
-    QString page = QStringLiteral("# Controls of the virtual device\n\n"
-                                  "<!-- Made by `virtual-device controls --markdown`: change the control table, not "
-                                  "this page. -->\n\n"
-                                  "`virtual-device ctl get NAME` shows a control, `virtual-device ctl set NAME VALUE` "
-                                  "changes it while the program runs. What is read only is reported by the device.\n");
+    QString page =
+        QStringLiteral("# Controls of the virtual device\n\n"
+                       "<!-- Made by `virtual-device controls --markdown`: change the control table, not "
+                       "this page. -->\n\n"
+                       "`virtual-device ctl get NAME` shows a control, `virtual-device ctl set NAME VALUE` "
+                       "changes it while the program runs. What is read only is reported by the device. `ctl set` "
+                       "and `--set` also take on and 1 for true, off and 0 for false.\n");
     QString group;
     for (const auto& spec : controlTable()) {
         if (groupOf(spec) != group) {
@@ -103,17 +127,7 @@ QString ControlDescription::markdown()
         }
         page += markdownRow(spec);
     }
-    return page;
-}
-
-QString ControlDescription::manual()
-{
-    QString list = QStringLiteral(".Bl -tag -width Ds\n");
-    for (const auto& spec : controlTable())
-        list += QStringLiteral(".It Cm %1\n%2.\nTakes %3; default %4.\n")
-                    .arg(fromView(spec.name), escapedForManual(fromView(spec.help)), escapedForManual(takes(spec)),
-                         spec.initial.empty() ? QStringLiteral("empty") : fromView(spec.initial));
-    return list + QStringLiteral(".El\n");
+    return page + regionTable();
 }
 
 QString ControlDescription::text()
@@ -121,8 +135,7 @@ QString ControlDescription::text()
     QString lines;
     for (const auto& spec : controlTable())
         lines += QStringLiteral("%1\n    %2\n    takes %3; default %4\n")
-                     .arg(fromView(spec.name), fromView(spec.help), takes(spec),
-                          spec.initial.empty() ? QStringLiteral("empty") : fromView(spec.initial));
+                     .arg(fromView(spec.name), fromView(spec.help), ControlDescription::takes(spec), startOf(spec));
     return lines;
 }
 
@@ -131,9 +144,7 @@ int ControlDescription::run(const QStringList& arguments)
     QCommandLineParser parser;
     parser.setApplicationDescription("Prints every control of the virtual device: what it is, what it takes.");
     parser.addHelpOption();
-    parser.addOptions({{"markdown", "as the page docs/controls.md"},
-                       {"man", "as a list of a manual page"},
-                       {"json", "for machines"}});
+    parser.addOptions({{"markdown", "as the page docs/controls.md"}, {"json", "for machines"}});
     if (!parser.parse(QStringList("virtual-device controls") + arguments) || !parser.positionalArguments().isEmpty()) {
         QTextStream(stderr) << "virtual-device controls: "
                             << (parser.errorText().isEmpty() ? "takes no words" : parser.errorText()) << "\n";
@@ -144,8 +155,6 @@ int ControlDescription::run(const QStringList& arguments)
         output << parser.helpText();
     else if (parser.isSet("markdown"))
         output << markdown();
-    else if (parser.isSet("man"))
-        output << manual();
     else if (parser.isSet("json"))
         output << json();
     else

@@ -23,12 +23,14 @@ public:
     /// or choices of a choice.
     [[nodiscard]] static QJsonObject object(const ControlSpec& spec);
 
-    /// The whole table as the page docs/controls.md, as the list of a manual page (mdoc), and as plain text.
+    /// "0..400 frames a second", "true or false", "read only, MHz".
+    [[nodiscard]] static QString takes(const ControlSpec& spec);
+
+    /// The whole table as the page docs/controls.md, with the window's regions, and as plain text.
     [[nodiscard]] static QString markdown();
-    [[nodiscard]] static QString manual();
     [[nodiscard]] static QString text();
 
-    /// `virtual-device controls [--markdown|--man|--json]`; `arguments` begin behind the word "controls". Returns the
+    /// `virtual-device controls [--markdown|--json]`; `arguments` begin behind the word "controls". Returns the
     /// exit status.
     [[nodiscard]] static int run(const QStringList& arguments);
 };

@@ -3,6 +3,12 @@
 
 #include "virtual-device/control/CtlParser.h"
 
+#include "virtual-device/control/ControlDescription.h"
+#include "virtual-device/registry/ControlTable.h"
+#include "virtual-device/registry/Values.h"
+#include "virtual-device/screen/KeyTable.h"
+#include "virtual-device/screen/RegionMap.h"
+
 #include <QCommandLineParser>
 #include <QRegularExpression>
 
@@ -44,10 +50,23 @@ QString usageText()
     QString text = QStringLiteral("usage: virtual-device ctl [--device NAME] [--json] COMMAND\n\n");
     for (const auto& command : commands)
         text += QStringLiteral("  %1 %2\n").arg(QLatin1String(command.usage), -44).arg(QLatin1String(command.help));
-    return text + QStringLiteral("\nKeys have their keyboard or keypad names (Return, Up, F5 or Soft1, F10 or Trigger, "
-                                 "F12 or Power, Escape, letters);\ncolours are green, red, white, other and none. "
-                                 "\"virtual-device controls\" explains the controls.\nExit status: 0 done, 1 did not "
-                                 "come true in time, 2 wrong use.\n");
+    return text + QStringLiteral("\nA wait lasts %1 s at most unless --within says otherwise. \"ctl --help\" names the "
+                                 "keys, regions and controls.\nExit status: 0 done, 1 did not come true in time, 2 "
+                                 "wrong use.\n")
+                      .arg(CtlRequest().within);
+}
+
+/// Every name that a command takes.
+QString namesText()
+{
+    QString text = QStringLiteral("\nKeys, by any of their names:\n    %1\n\nColours: %2\n\nRegions:\n")
+                       .arg(KeyTable::names().join(", "), RegionMap::words().join(", "));
+    for (const auto& region : RegionMap::regions())
+        text += QStringLiteral("    %1 %2\n").arg(fromView(region.name), -20).arg(fromView(region.help));
+    text += QStringLiteral("\nControls (\"virtual-device controls\" explains them; a switch is also on or off):\n");
+    for (const auto& spec : controlTable())
+        text += QStringLiteral("    %1 %2\n").arg(fromView(spec.name), -28).arg(ControlDescription::takes(spec));
+    return text;
 }
 
 /// Where a number begins with a minus sign the parser would look for options.
@@ -98,14 +117,14 @@ CtlRequest parseCtl(const QStringList& arguments)
                        {"device", "the device that is meant", "NAME"},
                        {"json", "results as JSON"},
                        {"follow", "goes on with what comes"},
-                       {"within", "the time limit", "SECONDS", "10"}});
+                       {"within", "the time limit", "SECONDS", QString::number(request.within)}});
     if (!parser.parse(QStringList("virtual-device ctl") + withNumbersLast(arguments))) {
         request.problem = parser.errorText();
         return request;
     }
     request.words = parser.positionalArguments();
     if (parser.isSet("help")) {
-        request.help = usageText();
+        request.help = usageText() + namesText();
         return request;
     }
     bool isNumber = false;

@@ -36,35 +36,43 @@ struct ControlSpec
     std::string_view choices; ///< words separated by "|", for Choice
     std::string_view initial; ///< as a person would type it
     std::string_view help;
+    std::string_view start; ///< what is in force at first where that is no constant
 };
 
 constexpr ControlSpec integerControl(std::string_view name, std::string_view unit, std::int64_t minimum,
                                      std::int64_t maximum, std::string_view initial, std::string_view help)
 {
-    return {name, ControlType::Integer, ControlAccess::Operator, unit, minimum, maximum, {}, initial, help};
+    return {name, ControlType::Integer, ControlAccess::Operator, unit, minimum, maximum, {}, initial, help, {}};
 }
 
 constexpr ControlSpec switchControl(std::string_view name, std::string_view initial, std::string_view help)
 {
-    return {name, ControlType::Boolean, ControlAccess::Operator, {}, 0, 1, {}, initial, help};
+    return {name, ControlType::Boolean, ControlAccess::Operator, {}, 0, 1, {}, initial, help, {}};
 }
 
 constexpr ControlSpec choiceControl(std::string_view name, std::string_view choices, std::string_view initial,
                                     std::string_view help)
 {
-    return {name, ControlType::Choice, ControlAccess::Operator, {}, 0, 0, choices, initial, help};
+    return {name, ControlType::Choice, ControlAccess::Operator, {}, 0, 0, choices, initial, help, {}};
 }
 
 constexpr ControlSpec textControl(std::string_view name, std::int64_t longest, std::string_view initial,
                                   std::string_view help)
 {
-    return {name, ControlType::Text, ControlAccess::Operator, {}, 0, longest, {}, initial, help};
+    return {name, ControlType::Text, ControlAccess::Operator, {}, 0, longest, {}, initial, help, {}};
 }
 
 /// The same row as something that the device reports and nobody sets.
 constexpr ControlSpec reported(ControlSpec spec)
 {
     spec.access = ControlAccess::Device;
+    return spec;
+}
+
+/// The same row as something that the device itself gives a value when it starts.
+constexpr ControlSpec startingWith(std::string_view start, ControlSpec spec)
+{
+    spec.start = start;
     return spec;
 }
 

@@ -36,24 +36,24 @@ constexpr std::array controls{
     choiceControl("battery.current_fault", fileFaults, "none", "how the current file fails"),
 
     // Real-time clock
-    integerControl("rtc.time", "s", 0, endOf2099, "0",
-                   "seconds since 1970-01-01 UTC; the clock runs on from what is set, and starts at the host's time"),
-    switchControl("rtc.running", "on", "off stops the clock"),
+    startingWith("the host's time", integerControl("rtc.time", "s", 0, endOf2099, "0",
+                                                   "seconds since 1970-01-01 UTC; the clock runs on from what is set")),
+    switchControl("rtc.running", "true", "false stops the clock"),
     choiceControl("rtc.fault", "none|EIO|ENODATA|EINVAL|ENOENT|EACCES|garbage", "none",
                   "how reading the clock fails; garbage answers with nonsense, ENOENT and EACCES refuse to open it"),
 
     // USB
-    switchControl("usb.hid", "on", "a HID device is plugged in at 1-1.4"),
+    switchControl("usb.hid", "true", "a HID device is plugged in at 1-1.4"),
     choiceControl("usb.hid_fault", linkFaults, "none", "how the entry of the HID device fails"),
-    switchControl("usb.gadget", "on", "a host is connected: the controller is a peripheral"),
+    switchControl("usb.gadget", "true", "a host is connected: the controller is a peripheral"),
     choiceControl("usb.gadget_content", contents, "normal", "what the mode file holds in place of the mode"),
     choiceControl("usb.gadget_fault", fileFaults, "none", "how the mode file fails"),
 
     // SD card
-    switchControl("sd.present", "on", "the card's block device exists; its mounted partition stays either way"),
+    switchControl("sd.present", "true", "the card's block device exists; its mounted partition stays either way"),
     choiceControl("sd.block_fault", linkFaults, "none", "how the entry of the card's block device fails"),
-    switchControl("sd.readonly", "off", "the data partition refuses every change"),
-    switchControl("sd.full", "off", "the data partition has no room left"),
+    switchControl("sd.readonly", "false", "the data partition refuses every change"),
+    switchControl("sd.full", "false", "the data partition has no room left"),
     choiceControl("sd.fault", fileFaults, "none", "how everything on the data partition fails"),
 
     // Signal lines
@@ -68,7 +68,7 @@ constexpr std::array controls{
     choiceControl("reset_line.fault", fileFaults, "none", "how the reset line's file fails"),
 
     // System log
-    switchControl("log.stalled", "off", "the log service stops reading, so that its queue fills"),
+    switchControl("log.stalled", "false", "the log service stops reading, so that its queue fills"),
 
     // The radio microcontroller on the serial line.
     choiceControl("radio.presence", "present|missing", "present",
@@ -150,8 +150,8 @@ constexpr std::array controls{
                   "ends its connection, refusing turns the next one away"),
     choiceControl("dsp.refuse", "none|attach|queue|load|start|transport|locate|transport-close|stop|queue-close|detach",
                   "none", "the request that fails"),
-    switchControl("dsp.replies", "on",
-                  "off: no request is carried out or answered, as if the DSP were dead behind a link that stands"),
+    switchControl("dsp.replies", "true",
+                  "false: no request is carried out or answered, as if the DSP were dead behind a link that stands"),
     choiceControl("dsp.locate", "found|late|never|missing", "found",
                   "how the search for the firmware's queue is answered; late: after dsp.ack_delay"),
     choiceControl(
@@ -190,14 +190,14 @@ constexpr std::array controls{
     reported(
         integerControl("dsp.receiver", "", lowest32, highest32, "0", "receiver enable: 0, 1 internal, 2 external")),
     reported(integerControl("dsp.hardware_test", "", lowest32, highest32, "0", "the hardware test that runs")),
-    reported(switchControl("dsp.gathering", "off", "data gathering")),
+    reported(switchControl("dsp.gathering", "false", "data gathering")),
     reported(textControl("dsp.channels", 48, "", "the four channels of data gathering")),
     reported(integerControl("dsp.base_address", "", lowest32, highest32, "0", "base address of data gathering")),
-    reported(switchControl("dsp.long_range_antenna", "off", "long range antenna")),
-    reported(switchControl("dsp.upsampling", "off", "upsampling")),
-    reported(switchControl("dsp.pairing_mode", "off", "pairing and upgrade mode")),
+    reported(switchControl("dsp.long_range_antenna", "false", "long range antenna")),
+    reported(switchControl("dsp.upsampling", "false", "upsampling")),
+    reported(switchControl("dsp.pairing_mode", "false", "pairing and upgrade mode")),
     reported(integerControl("dsp.pairing_parameter", "", lowest32, highest32, "0", "its parameter")),
-    reported(switchControl("dsp.enabled", "off", "what the program set with its enable command")),
+    reported(switchControl("dsp.enabled", "false", "what the program set with its enable command")),
     reported(integerControl("dsp.trigger", "", lowest32, highest32, "0", "data gathering trigger")),
     reported(integerControl("dsp.line_noise_detection", "", lowest32, highest32, "0", "line noise detection")),
     reported(integerControl("dsp.connections", "", 0, plenty, "0", "programs that have connected")),
@@ -214,9 +214,9 @@ constexpr std::array controls{
     // The loudspeaker and its volume control.
     choiceControl("audio.presence", "present|missing|no-output|no-mixer", "present",
                   "what of the sound card exists; read when the program's surroundings are built"),
-    switchControl("audio.forget", "off",
-                  "puts audio.gap_ms, audio.late_ms and audio.mismatches back to 0; off again when done"),
-    reported(switchControl("audio.playing", "off", "the sound is heard")),
+    switchControl("audio.forget", "false",
+                  "puts audio.gap_ms, audio.late_ms and audio.mismatches back to 0; false again when done"),
+    reported(switchControl("audio.playing", "false", "the sound is heard")),
     reported(integerControl("audio.sounds", "", 0, plenty, "0", "times the sound began")),
     reported(integerControl("audio.buffers", "", 0, plenty, "0", "buffers of 256 ms heard, silent ones included")),
     reported(integerControl("audio.gap_ms", "ms", 0, plenty, "0", "longest silence since the first sound")),
