@@ -6,9 +6,9 @@
 #include "tests/support/AssertionLine.h"
 #include "tests/support/LogCapture.h"
 #include "tests/virtual-device/ModelThread.h"
+#include "tests/virtual-device/RegistryAccess.h"
 #include "virtual-device/dsp/DspModel.h"
 #include "virtual-device/dsp/SensorFrame.h"
-#include "virtual-device/registry/Registry.h"
 
 #include <QElapsedTimer>
 #include <QFile>
@@ -55,26 +55,16 @@ struct Heard
 
 /// The program's side of the DSP link, through its library and a real socket, and the DSP of the virtual device,
 /// written apart from each other.
-class DspCrossCheckTest : public QObject
+class DspCrossCheckTest : public TestSupport::RegistryAccess
 {
     Q_OBJECT
 
     TestSupport::LogCapture log;
-    std::unique_ptr<Registry> registry;
     std::unique_ptr<ModelThread<DspModel>> model;
     TestSupport::AssertionLine buttons;
     std::unique_ptr<Domain::DspPort> port;
     std::unique_ptr<Heard> heard;
     std::unique_ptr<Domain::Dsp> dsp;
-
-    void set(const char* name, const QJsonValue& value) const
-    {
-        const auto wrong = registry->set(QString::fromLatin1(name), value);
-        QVERIFY2(!wrong, qPrintable(wrong.value_or(QString())));
-    }
-    [[nodiscard]] qint64 number(const char* name) const { return registry->integer(QString::fromLatin1(name)); }
-    [[nodiscard]] QString text(const char* name) const { return registry->text(QString::fromLatin1(name)); }
-    [[nodiscard]] bool flag(const char* name) const { return registry->flag(QString::fromLatin1(name)); }
 
     void listen()
     {

@@ -3,8 +3,8 @@
 
 #pragma once
 
+#include "tests/virtual-device/RegistryAccess.h"
 #include "virtual-device/dsp/DspModel.h"
-#include "virtual-device/registry/Registry.h"
 
 #include <QFile>
 #include <QTest>
@@ -113,23 +113,13 @@ inline const QByteArray image = QByteArray("/dsp.out").toHex();
 inline const QByteArray dspQueue = QByteArray("DSPMSGQ0").toHex();
 
 /// A DSP, its registry and a program's end of its socket, anew for every case.
-class Fixture : public QObject
+class Fixture : public TestSupport::RegistryAccess
 {
 protected:
-    std::unique_ptr<Registry> registry;
     std::unique_ptr<DspModel> dsp;
     std::unique_ptr<SocketClient> program;
     quint32 serial = 0;
     const QString path = QStringLiteral("/tmp/dsplink-%1").arg(::getpid());
-
-    void set(const char* name, const QJsonValue& value) const
-    {
-        const auto wrong = registry->set(QString::fromLatin1(name), value);
-        QVERIFY2(!wrong, qPrintable(wrong.value_or(QString())));
-    }
-    [[nodiscard]] qint64 number(const char* name) const { return registry->integer(QString::fromLatin1(name)); }
-    [[nodiscard]] QString text(const char* name) const { return registry->text(QString::fromLatin1(name)); }
-    [[nodiscard]] bool flag(const char* name) const { return registry->flag(QString::fromLatin1(name)); }
 
     /// Asks and waits for the one reply: status and value.
     void request(int kind, const QByteArray& body, const QByteArray& status, const QByteArray& value = "00000000")

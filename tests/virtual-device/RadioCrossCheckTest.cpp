@@ -7,8 +7,8 @@
 #include "tests/support/LogCapture.h"
 #include "tests/support/QueuedSpy.h"
 #include "tests/virtual-device/ModelThread.h"
+#include "tests/virtual-device/RegistryAccess.h"
 #include "virtual-device/radio/RadioModel.h"
-#include "virtual-device/registry/Registry.h"
 
 #include <QDir>
 #include <QFile>
@@ -29,25 +29,15 @@ const QString resetLine = QStringLiteral("/sys/class/misc/msp430/reset");
 
 /// The program's side of the radio link and the radio microcontroller of the virtual device, written apart from each
 /// other, on one line.
-class RadioCrossCheckTest : public QObject
+class RadioCrossCheckTest : public TestSupport::RegistryAccess
 {
     Q_OBJECT
 
     TestSupport::LogCapture log;
-    std::unique_ptr<Registry> registry;
     std::unique_ptr<ModelThread<RadioModel>> radio;
     std::unique_ptr<Domain::SerialPort> port;
     std::unique_ptr<BeaconProcessor> beacon;
     QList<Domain::AccelReading> readings;
-
-    void set(const char* name, const QJsonValue& value) const
-    {
-        const auto wrong = registry->set(QString::fromLatin1(name), value);
-        QVERIFY2(!wrong, qPrintable(wrong.value_or(QString())));
-    }
-    [[nodiscard]] qint64 number(const char* name) const { return registry->integer(QString::fromLatin1(name)); }
-    [[nodiscard]] QString text(const char* name) const { return registry->text(QString::fromLatin1(name)); }
-    [[nodiscard]] bool flag(const char* name) const { return registry->flag(QString::fromLatin1(name)); }
 
     /// The command was taken, and its end needs nobody's event loop.
     void finished(bool accepted) const

@@ -3,10 +3,10 @@
 
 #pragma once
 
+#include "tests/virtual-device/RegistryAccess.h"
 #include "virtual-device/radio/RadioFrame.h"
 #include "virtual-device/radio/RadioFrameReader.h"
 #include "virtual-device/radio/RadioModel.h"
-#include "virtual-device/registry/Registry.h"
 
 #include <QSignalSpy>
 #include <QTest>
@@ -99,21 +99,12 @@ inline QByteArray joined(const QSignalSpy& deliveries)
 }
 
 /// A radio, its registry and a program's end of its line, anew for every case.
-class Fixture : public QObject
+class Fixture : public TestSupport::RegistryAccess
 {
 protected:
-    std::unique_ptr<Registry> registry;
     std::unique_ptr<RadioModel> radio;
     std::unique_ptr<TtyClient> tty;
 
-    void set(const char* name, const QJsonValue& value) const
-    {
-        const auto wrong = registry->set(QString::fromLatin1(name), value);
-        QVERIFY2(!wrong, qPrintable(wrong.value_or(QString())));
-    }
-    [[nodiscard]] qint64 number(const char* name) const { return registry->integer(QString::fromLatin1(name)); }
-    [[nodiscard]] QString text(const char* name) const { return registry->text(QString::fromLatin1(name)); }
-    [[nodiscard]] bool flag(const char* name) const { return registry->flag(QString::fromLatin1(name)); }
     void command(const char* hex) const { QVERIFY(tty->write(radioFrame(bytes(hex)))); }
     /// Sends a command and waits for its plain acknowledgement, which it then forgets.
     void acknowledged(const char* hex) const
