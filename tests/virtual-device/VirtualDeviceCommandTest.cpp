@@ -536,6 +536,9 @@ void VirtualDeviceCommandTest::forbiddenNamespacesAreNamed()
     QCOMPARE(outcome.status, 1);
     QVERIFY2(outcome.errors.startsWith("virtual-device: this machine forbids user namespaces (bwrap: "),
              qPrintable(outcome.errors));
+    // The switch for everybody and Debian's for ordinary users.
+    QVERIFY(outcome.errors.contains("\"sysctl user.max_user_namespaces="));
+    QVERIFY(outcome.errors.contains("\"sysctl kernel.unprivileged_userns_clone=1\""));
     QCOMPARE(outcome.errors.count('\n'), 1);
 }
 

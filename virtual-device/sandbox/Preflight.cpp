@@ -68,8 +68,9 @@ std::optional<QString> missingNamespaces()
     if (trial.waitForFinished() && trial.exitStatus() == QProcess::NormalExit && trial.exitCode() == 0)
         return std::nullopt;
     const auto reason = QString::fromLocal8Bit(trial.readAllStandardError()).simplified();
-    return QStringLiteral("this machine forbids user namespaces (%1): allow them, for example with \"sysctl "
-                          "user.max_user_namespaces=10000\", or in the container's settings")
+    return QStringLiteral("this machine forbids user namespaces (%1): allow them as root, with \"sysctl "
+                          "user.max_user_namespaces=10000\" or, where ordinary users alone are refused, \"sysctl "
+                          "kernel.unprivileged_userns_clone=1\", or in the container's settings")
         .arg(reason);
 }
 
