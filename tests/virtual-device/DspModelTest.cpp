@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 
 #include "tests/virtual-device/DspFixture.h"
+#include "virtual-device/dsp/DspSocket.h"
 
 #include <QElapsedTimer>
 #include <QSignalSpy>
@@ -298,6 +299,28 @@ private slots:
         set("dsp.presence", "present");
         connectProgram();
         bringUp();
+    }
+
+    void aProgramThatSendsWithoutEndLeavesTheThreadToOthers()
+    {
+        constexpr int plenty = 20'000;
+        const QString name = path + QStringLiteral("-endless");
+        VirtualDevice::DspSocket socket;
+        QVERIFY(!socket.listen(name));
+        const SocketClient sender(name);
+        QTRY_VERIFY(socket.isConnected());
+        int packets = 0;
+        connect(&socket, &VirtualDevice::DspSocket::received, this, [&] { // there is always one more to read
+            if (++packets < plenty)
+                QVERIFY(sender.send("00"));
+        });
+        int packetsBeforeOthers = 0;
+        QVERIFY(sender.send("00"));
+        QTRY_VERIFY(packets > 0);
+        QTimer::singleShot(0, this, [&] { packetsBeforeOthers = packets; });
+        QTRY_COMPARE(packets, plenty);
+        QVERIFY(packetsBeforeOthers > 0);
+        QVERIFY(packetsBeforeOthers < plenty);
     }
 
     void aPathThatCannotBeServedIsReported()

@@ -7,6 +7,7 @@
 #include <QSignalSpy>
 #include <QTemporaryDir>
 #include <QTest>
+#include <QTimer>
 
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -72,6 +73,7 @@ private slots:
     void stalledServiceLetsItsQueueFillAndCatchesUpLater();
     void stallBeforeOpeningHolds();
     void openReplacesASocketThatWasLeft();
+    void programThatLogsWithoutEndLeavesTheThreadToOthers();
     void closeRemovesTheSocketAndKeepsTheLines();
     void pathThatIsTooLongForASocketIsRefused();
 
@@ -251,6 +253,27 @@ void LogStoreTest::openReplacesASocketThatWasLeft()
     LogStore store;
     QCOMPARE(store.open(path), std::nullopt);
     QVERIFY(Sender(path).isConnected);
+}
+
+void LogStoreTest::programThatLogsWithoutEndLeavesTheThreadToOthers()
+{
+    constexpr int plenty = 20'000;
+    LogStore store;
+    QCOMPARE(store.open(path), std::nullopt);
+    const Sender sender(path);
+    int lines = 0;
+    // There is always one more to read.
+    connect(&store, &LogStore::lineReceived, this, [&] {
+        if (++lines < plenty)
+            QVERIFY(sender.send("<12>VQK: more"));
+    });
+    int linesBeforeOthers = 0;
+    QVERIFY(sender.send("<12>VQK: first"));
+    QTRY_VERIFY_WITH_TIMEOUT(lines > 0, 20000);
+    QTimer::singleShot(0, this, [&] { linesBeforeOthers = lines; });
+    QTRY_COMPARE_WITH_TIMEOUT(lines, plenty, 20000);
+    QVERIFY(linesBeforeOthers > 0);
+    QVERIFY(linesBeforeOthers < plenty);
 }
 
 void LogStoreTest::closeRemovesTheSocketAndKeepsTheLines()

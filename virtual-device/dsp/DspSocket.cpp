@@ -125,7 +125,9 @@ void DspSocket::adopt(int descriptor)
 
 void DspSocket::readAvailable()
 {
-    while (isConnected() && readOne()) {
+    // Who sends as fast as it is read must not keep the thread from everything else; what is left is announced again.
+    constexpr int mostAtOnce = 1000;
+    for (int remaining = mostAtOnce; remaining > 0 && isConnected() && readOne(); --remaining) {
     }
 }
 

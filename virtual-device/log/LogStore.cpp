@@ -123,8 +123,10 @@ LogLine LogStore::parsed(const QByteArray& datagram)
 
 void LogStore::receive()
 {
+    // Who logs as fast as it is read must not keep the thread from everything else; what is left is announced again.
+    constexpr int mostAtOnce = 1000;
     std::array<char, 65536> buffer{};
-    for (;;) {
+    for (int remaining = mostAtOnce; remaining > 0; --remaining) {
         const auto length = ::recv(descriptor, buffer.data(), buffer.size(), MSG_DONTWAIT);
         if (length < 0)
             return;
