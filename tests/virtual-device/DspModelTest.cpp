@@ -6,6 +6,7 @@
 
 #include <QElapsedTimer>
 #include <QSignalSpy>
+#include <QTimer>
 
 using namespace DspModelTesting;
 

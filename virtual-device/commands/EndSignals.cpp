@@ -45,6 +45,9 @@ void setHandler(void (*handler)(int))
 EndSignals::EndSignals(QObject* parent) : QObject(parent)
 {
     wakeUp = ::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
+    // Without it nobody would hear of the signals: they end the process themselves then.
+    if (wakeUp < 0)
+        return;
     notifier = std::make_unique<QSocketNotifier>(wakeUp, QSocketNotifier::Read);
     connect(notifier.get(), &QSocketNotifier::activated, this, [this] {
         std::uint64_t count = 0;
@@ -58,7 +61,8 @@ EndSignals::~EndSignals()
 {
     setHandler(SIG_DFL);
     notifier.reset();
-    ::close(wakeUp);
+    if (wakeUp >= 0)
+        ::close(wakeUp);
     wakeUp = -1;
 }
 

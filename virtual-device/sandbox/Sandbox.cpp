@@ -3,6 +3,7 @@
 
 #include "virtual-device/sandbox/Sandbox.h"
 
+#include <QDeadlineTimer>
 #include <QDir>
 #include <QFile>
 #include <QJsonDocument>
@@ -16,6 +17,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <cerrno>
 #include <chrono>
 #include <csignal>
 
@@ -185,7 +187,10 @@ void Sandbox::awaitLastProcess()
         readStatus();
     if (firstProcess >= 0) {
         pollfd wait{firstProcess, POLLIN, 0};
-        ::poll(&wait, 1, lastProcessLimit);
+        const QDeadlineTimer limit(lastProcessLimit);
+        // A signal, such as a second Ctrl-C, cuts a poll short.
+        while (::poll(&wait, 1, static_cast<int>(limit.remainingTime())) < 0 && errno == EINTR) {
+        }
         ::close(firstProcess);
     }
     statusNotifier.reset();
