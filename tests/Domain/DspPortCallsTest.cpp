@@ -11,6 +11,7 @@
 #include <algorithm>
 #include <atomic>
 #include <climits>
+#include <csignal>
 #include <memory>
 
 using Domain::DspPort;
@@ -58,6 +59,7 @@ private slots:
     {
         port.reset();
         InstantDsp::refuse();
+        InstantDsp::takeTerminationSignals();
         log.reset();
     }
 
@@ -65,6 +67,29 @@ private slots:
     {
         QVERIFY(port->open(QIODevice::ReadWrite));
         QCOMPARE(InstantDsp::takeCalls(), openingCalls);
+    }
+
+    void terminationSignalsStayTheProgramsOwn_data()
+    {
+        QTest::addColumn<QByteArray>("call");
+        QTest::newRow("none") << QByteArray();
+        QTest::newRow("PROC_setup") << QByteArray("PROC_setup");
+        QTest::newRow("PROC_attach") << QByteArray("PROC_attach");
+    }
+
+    /// Whatever handlers the device's library sets for them.
+    void terminationSignalsStayTheProgramsOwn()
+    {
+        QFETCH(const QByteArray, call);
+        const auto ownHandler = [](int) {};
+        for (const int number : {SIGTERM, SIGINT})
+            std::signal(number, ownHandler);
+        InstantDsp::takeTerminationSignals(call.constData());
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        for (const int number : {SIGTERM, SIGINT}) {
+            const auto after = std::signal(number, SIG_DFL);
+            QVERIFY(after == +ownHandler);
+        }
     }
 
     void closingIsFiveCallsInOrder()

@@ -12,7 +12,9 @@
 #include <atomic>
 #include <chrono>
 #include <condition_variable>
+#include <csignal>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <mutex>
 
@@ -86,6 +88,7 @@ struct Record
     // The port's own thread asks for messages.
     std::atomic<std::size_t> fetches = 0;
     std::atomic<const char*> refused = "";
+    const char* takesSignals = "";
 };
 
 Record record;
@@ -111,6 +114,9 @@ DSP_STATUS called(DSP_STATUS result, const char* name, const char* format, Argum
             static_cast<std::size_t>(std::snprintf(text + length, longestCall - length, format, arguments...));
         std::snprintf(text + length + rest, longestCall - length - rest, ")");
     }
+    if (std::strcmp(name, record.takesSignals) == 0)
+        for (const int number : {SIGTERM, SIGINT})
+            std::signal(number, [](int) { std::_Exit(1); });
     return isRefused(name) ? static_cast<DSP_STATUS>(TestSupport::InstantDsp::refusal) : result;
 }
 
@@ -141,6 +147,11 @@ QStringList TestSupport::InstantDsp::takeCalls()
 std::size_t TestSupport::InstantDsp::fetches()
 {
     return record.fetches;
+}
+
+void TestSupport::InstantDsp::takeTerminationSignals(const char* call)
+{
+    record.takesSignals = call;
 }
 
 void TestSupport::InstantDsp::refuse(const char* call)

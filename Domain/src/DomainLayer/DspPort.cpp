@@ -16,7 +16,9 @@
 #include <QtEndian>
 
 #include <algorithm>
+#include <array>
 #include <atomic>
+#include <csignal>
 #include <cstring>
 #include <optional>
 
@@ -58,6 +60,33 @@ constexpr Uint16 incomingMessageId = 100;
 constexpr int getTimeout = 500;        // ms
 constexpr int threadEndTimeout = 5000; // ms
 constexpr qsizetype fullAbove = 100;
+
+/// The program ends in order on a termination signal. The device's library sets handlers of its own when a process
+/// attaches, which end it wherever it is: what was set before comes back, and the link is closed by the port.
+class TerminationActionsKept
+{
+public:
+    TerminationActionsKept()
+    {
+        for (Action& action : actions)
+            sigaction(action.signal, nullptr, &action.before);
+    }
+    ~TerminationActionsKept()
+    {
+        for (const Action& action : actions)
+            sigaction(action.signal, &action.before, nullptr);
+    }
+    TerminationActionsKept(const TerminationActionsKept&) = delete;
+    TerminationActionsKept& operator=(const TerminationActionsKept&) = delete;
+
+private:
+    struct Action
+    {
+        int signal;
+        struct sigaction before;
+    };
+    std::array<Action, 2> actions{{{SIGTERM, {}}, {SIGINT, {}}}};
+};
 constexpr qsizetype emptiedBelow = 31;
 
 /// DSPLink's result codes are negative numbers when they fail; logs show the 32 bits.
@@ -186,8 +215,11 @@ bool DspPort::open(OpenMode mode)
 
 void DspPort::PrivateData::openLink()
 {
-    reportFailure(__LINE__, "PROC_setup(NULL)", PROC_setup(nullptr));
-    reportFailure(__LINE__, "PROC_attach(dspProcessorId, NULL)", PROC_attach(dspProcessorId, nullptr));
+    {
+        const TerminationActionsKept kept;
+        reportFailure(__LINE__, "PROC_setup(NULL)", PROC_setup(nullptr));
+        reportFailure(__LINE__, "PROC_attach(dspProcessorId, NULL)", PROC_attach(dspProcessorId, nullptr));
+    }
     reportFailure(__LINE__, "POOL_open(this->privateData->applicationPoolId, &poolAttributes)",
                   POOL_open(applicationPoolId, &poolAttributes));
     reportFailure(__LINE__, "MSGQ_open(processorMessageQueueName, &this->privateData->processorMessageQueue, NULL)",
