@@ -283,7 +283,7 @@ private slots:
         ButtonsTest test(nullptr);
         test.show();
         QVERIFY(QTest::qWaitForWindowExposed(&test));
-        QTest::qWait(100);
+        TestSupport::paintWhatIsUnderWay(test);
         const TestSupport::PaintCounter counter(test);
         int paintsAtSignal = 0;
         QString styleAtSignal;

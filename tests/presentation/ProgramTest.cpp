@@ -247,6 +247,16 @@ private slots:
         QVERIFY(TestSupport::readFile(screenReport).startsWith("QT_QPA_FB_FORCE_FULLSCREEN=0\n"));
     }
 
+    /// The linker would leave them out of the program if they lay in a library.
+    void holdsItsResources()
+    {
+        Program program;
+        program.startWithScreenProbe();
+        QVERIFY(hasScreenReport());
+        const QByteArray report = TestSupport::readFile(screenReport);
+        QVERIFY2(report.contains("configuration=26\nsound=64044\nprefix=/usr/share\n"), report);
+    }
+
     /// Texts fit their regions, whatever the surroundings say of the display and the toolkit of its default font.
     void textIsAsLargeAsTheLayoutWasMadeFor()
     {

@@ -152,7 +152,7 @@ private slots:
         panel.test.show();
         QVERIFY(QTest::qWaitForWindowExposed(&panel.test));
         panel.test.start();
-        QTest::qWait(100);
+        TestSupport::paintWhatIsUnderWay(panel.test);
         const TestSupport::PaintCounter counter(child<QLabel>(panel.test, "labelTransmitting"));
         QSet<QString> textsBefore;
         QSet<QString> textsAfter;
@@ -384,14 +384,14 @@ private slots:
         QVERIFY(QTest::qWaitForWindowExposed(&panel.test));
         emit panel.beacon.pingResponse();
         panel.test.radioResponseReceived();
-        QTest::qWait(100);
+        TestSupport::paintWhatIsUnderWay(panel.test);
         const TestSupport::PaintCounter counter(panel.test);
         emit panel.beacon.pingResponse();
         panel.test.radioResponseReceived();
         panel.test.frequencyDown();
         panel.test.powerLevelDown();
         panel.test.updateTransmitIndicator();
-        QTest::qWait(100);
+        TestSupport::paintWhatIsUnderWay(panel.test);
         QCOMPARE(counter.paints, 0);
     }
 

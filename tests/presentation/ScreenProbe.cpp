@@ -5,6 +5,7 @@
 #include <QFont>
 #include <QGenericPlugin>
 #include <QGuiApplication>
+#include <QLibraryInfo>
 #include <QTimer>
 #include <QWindow>
 
@@ -13,9 +14,13 @@
 namespace
 {
 
+QByteArray sizeOf(const char* resource)
+{
+    return QByteArray::number(QFile(QString::fromLatin1(resource)).size());
+}
+
 /// Closes the window, as the user of a desktop would, after writing down what the framebuffer's plugin and the layouts
-/// go by. The end
-/// of the window goes to the log.
+/// go by, and what is compiled into the program. The end of the window goes to the log.
 void lookAt(QWindow& window)
 {
     QObject::connect(&window, &QObject::destroyed, [] { syslog(LOG_USER | LOG_INFO, "window destroyed"); });
@@ -25,6 +30,9 @@ void lookAt(QWindow& window)
     report.write("QT_QPA_FB_FORCE_FULLSCREEN=" + qgetenv("QT_QPA_FB_FORCE_FULLSCREEN") + '\n');
     report.write("QT_FONT_DPI=" + qgetenv("QT_FONT_DPI") + '\n');
     report.write("points=" + QByteArray::number(QGuiApplication::font().pointSizeF()) + '\n');
+    report.write("configuration=" + sizeOf(":/qt/etc/qt.conf") + '\n');
+    report.write("sound=" + sizeOf(":/sounds/TestSound.wav") + '\n');
+    report.write("prefix=" + QLibraryInfo::path(QLibraryInfo::PrefixPath).toUtf8() + '\n');
     report.write("closed=" + QByteArray::number(int(window.close())) + '\n');
     report.close();
     report.rename(QStringLiteral("/mnt/screen-probe"));

@@ -76,6 +76,16 @@ bool PaintCounter::eventFilter(QObject* /*receiver*/, QEvent* event)
     return false;
 }
 
+void paintWhatIsUnderWay(QWidget& widget)
+{
+    const PaintCounter counter(widget);
+    int before = 0;
+    do {
+        before = counter.paints;
+        QCoreApplication::processEvents();
+    } while (counter.paints != before);
+}
+
 QColor paintedColour(QWidget& widget)
 {
     return widget.grab().toImage().pixelColor(2, 2);

@@ -55,6 +55,9 @@ public:
     bool eventFilter(QObject* receiver, QEvent* event) override;
 };
 
+/// Handles what is under way until nothing of the widget is painted any more.
+void paintWhatIsUnderWay(QWidget& widget);
+
 /// The child of that name and type; the test ends when there is none.
 template <typename Type> Type& child(QObject& parent, const char* name)
 {

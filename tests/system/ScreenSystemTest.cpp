@@ -40,6 +40,7 @@ private slots:
     void oneFaultTurnsOneRegionRedAndItComesBack_data();
     void oneFaultTurnsOneRegionRedAndItComesBack();
     void clockTicks();
+    void garbageFromTheClockLeavesTheTimeAndTheWindowAsTheyAre();
     void readOnlyCardThatHoldsItsFileStaysGreen();
     void deadPowerLatchLeavesThePowerKeyAnswering();
     void unknownKeyShowsItsNumber();
@@ -132,6 +133,27 @@ void ScreenSystemTest::clockTicks()
     REQUIRE(device.set("rtc.running", true));
     REQUIRE(ScreenHealth::passesARound(device));
     QVERIFY(!ScreenText::isAt(device.screenshot(), clockField, "3/8/11 3:04:06 AM", ScreenText::named()));
+}
+
+/// The HID device is looked at as often as the clock: when its region has changed four times, the clock has been read.
+void ScreenSystemTest::garbageFromTheClockLeavesTheTimeAndTheWindowAsTheyAre()
+{
+    constexpr qint64 afternoon = 1299510245;
+    const QString shown = QStringLiteral("3/7/11 3:04:05 PM");
+    REQUIRE(device.set("rtc.running", false));
+    REQUIRE(device.set("rtc.time", afternoon));
+    QVERIFY(comesToShow(clockField, shown));
+    REQUIRE(device.set("rtc.fault", "garbage"));
+    for (const char* const colour : {"red", "green", "red", "green"}) {
+        REQUIRE(device.set("usb.hid", qstrcmp(colour, "green") == 0));
+        REQUIRE(device.waitRegion("usb-device", colour));
+    }
+    QVERIFY(ScreenText::isAt(device.screenshot(), clockField, shown, ScreenText::named()));
+    QCOMPARE(ScreenHealth::differences(device), QString());
+    REQUIRE(device.set("rtc.time", afternoon + 1));
+    REQUIRE(device.set("rtc.fault", "none"));
+    QVERIFY(comesToShow(clockField, "3/7/11 3:04:06 PM"));
+    REQUIRE(device.set("rtc.running", true));
 }
 
 /// The probe file is written once, when it is missing, and only read from then on.
