@@ -100,6 +100,7 @@ private slots:
     void ownStateGoesWithTheDevice();
     void windowStandsAndItsScreenIsReachableOnThisMachineAlone();
     void outputOfTheProgramIsKept();
+    void endlessOutputIsKeptUpToALimit();
     void programThatIsAskedEnds();
     void programThatRefusesToEndIsKilled();
     void programThatIsKilledTakesTheDeviceDown();
@@ -340,6 +341,20 @@ void DeviceTest::outputOfTheProgramIsKept()
     Device device(window());
     QVERIFY(stands(device));
     QTRY_VERIFY_WITH_TIMEOUT(device.program().output().contains("window program in vnc"), limit);
+}
+
+void DeviceTest::endlessOutputIsKeptUpToALimit()
+{
+    using VirtualDevice::Sandbox;
+    DeviceOptions options = shell("head -c 50000000 /dev/zero | tr '\\0' x");
+    options.isOwnCommand = false;
+    Device device(options);
+    QCOMPARE(statusOf(device), 0);
+    qsizetype kept = 0;
+    for (const auto& line : device.program().output())
+        kept += line.size();
+    QVERIFY2(kept <= Sandbox::largestOutput, qPrintable(QString::number(kept)));
+    QVERIFY2(kept > Sandbox::largestOutput / 2, qPrintable(QString::number(kept)));
 }
 
 void DeviceTest::programThatIsAskedEnds()

@@ -74,6 +74,7 @@ private slots:
     void stallBeforeOpeningHolds();
     void openReplacesASocketThatWasLeft();
     void programThatLogsWithoutEndLeavesTheThreadToOthers();
+    void giantLinesAreKeptUpToALimit();
     void closeRemovesTheSocketAndKeepsTheLines();
     void pathThatIsTooLongForASocketIsRefused();
 
@@ -274,6 +275,21 @@ void LogStoreTest::programThatLogsWithoutEndLeavesTheThreadToOthers()
     QTRY_COMPARE_WITH_TIMEOUT(lines, plenty, 20000);
     QVERIFY(linesBeforeOthers > 0);
     QVERIFY(linesBeforeOthers < plenty);
+}
+
+void LogStoreTest::giantLinesAreKeptUpToALimit()
+{
+    constexpr qsizetype length = 60'000;
+    constexpr int sent = LogStore::largestText / length + 20;
+    LogStore store;
+    QCOMPARE(store.open(path), std::nullopt);
+    const Sender sender(path);
+    for (int number = 1; number <= sent; ++number) {
+        QVERIFY(sender.send("<12>VQK: " + QByteArray(length, 'x')));
+        QTRY_VERIFY_WITH_TIMEOUT(!store.lines().isEmpty() && store.lines().last().number == number, 20000);
+    }
+    QCOMPARE(store.lines().size(), LogStore::largestText / length);
+    QCOMPARE(store.lines().first().number, sent - LogStore::largestText / length + 1);
 }
 
 void LogStoreTest::closeRemovesTheSocketAndKeepsTheLines()

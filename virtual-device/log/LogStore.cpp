@@ -121,6 +121,16 @@ LogLine LogStore::parsed(const QByteArray& datagram)
     return line;
 }
 
+void LogStore::keep(const LogLine& line)
+{
+    kept.push_back(line);
+    keptText += line.text.size();
+    while (kept.size() > capacity || keptText > largestText) {
+        keptText -= kept.front().text.size();
+        kept.pop_front();
+    }
+}
+
 void LogStore::receive()
 {
     // Who logs as fast as it is read must not keep the thread from everything else; what is left is announced again.
@@ -133,9 +143,7 @@ void LogStore::receive()
         LogLine line = parsed(QByteArray(buffer.data(), length));
         line.number = ++received;
         line.received = QDateTime::currentDateTimeUtc();
-        kept.push_back(line);
-        if (kept.size() > capacity)
-            kept.pop_front();
+        keep(line);
         emit lineReceived(line);
         // A listener may have closed or stalled the service.
         if (descriptor < 0 || isStalled)

@@ -41,6 +41,7 @@ class LogStore : public QObject
 
 public:
     static constexpr std::size_t capacity = 10'000;
+    static constexpr qsizetype largestText = 32 * 1024 * 1024;
 
     explicit LogStore(QObject* parent = nullptr);
     ~LogStore() override;
@@ -53,7 +54,7 @@ public:
     /// A stalled service keeps its socket but reads nothing, so that its senders meet a full queue.
     void setStalled(bool stalled);
 
-    /// The newest messages, oldest first, at most `capacity`.
+    /// The newest messages, oldest first, at most `capacity` and together at most `largestText` characters.
     [[nodiscard]] QList<LogLine> lines() const;
     /// Those of them that came after the message `number`.
     [[nodiscard]] QList<LogLine> linesAfter(qint64 number) const;
@@ -64,6 +65,7 @@ signals:
     void lineReceived(const VirtualDevice::LogLine& line);
 
 private:
+    void keep(const LogLine& line);
     void receive();
 
     QString socketPath;
@@ -71,6 +73,7 @@ private:
     bool isStalled = false;
     std::unique_ptr<QSocketNotifier> notifier;
     std::deque<LogLine> kept;
+    qsizetype keptText = 0; ///< characters
     qint64 received = 0;
 };
 

@@ -144,8 +144,11 @@ void Sandbox::readOutput()
 void Sandbox::keep(const QByteArray& line)
 {
     kept.push_back(line);
-    if (kept.size() > outputCapacity)
+    keptBytes += line.size();
+    while (kept.size() > outputCapacity || keptBytes > largestOutput) {
+        keptBytes -= kept.front().size();
         kept.pop_front();
+    }
     emit outputReceived(line);
 }
 

@@ -34,7 +34,8 @@ public:
         Inherited, ///< the program has ours, as a person's own command needs it
     };
 
-    static constexpr std::size_t outputCapacity = 10'000; ///< lines
+    static constexpr std::size_t outputCapacity = 10'000;        ///< lines
+    static constexpr qsizetype largestOutput = 32 * 1024 * 1024; ///< bytes of them together
 
     explicit Sandbox(QObject* parent = nullptr);
     ~Sandbox() override;
@@ -75,6 +76,7 @@ private:
     int firstProcess = -1; ///< a descriptor for it
     QByteArray unfinishedLine;
     std::deque<QByteArray> kept;
+    qsizetype keptBytes = 0;
 };
 
 } // namespace VirtualDevice
