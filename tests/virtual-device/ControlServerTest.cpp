@@ -110,6 +110,7 @@ private slots:
     void subscriberThatNeverReadsIsDropped();
     void clientThatIsDroppedChangesNothingMore();
     void otherRequestsAreAnsweredDuringAWait();
+    void waitsOfAClientAreLimited();
     void logReturnsTheLinesAfterAMark();
     void logRefusesAMarkThatIsNone();
     void keysAndPicturesNeedAProgram();
@@ -425,6 +426,23 @@ void ControlServerTest::otherRequestsAreAnsweredDuringAWait()
         order.append(raw.answer().value("id").toInt());
     std::sort(order.begin() + 1, order.end());
     QCOMPARE(order, (QList<int>{2, 1, 3}));
+}
+
+void ControlServerTest::waitsOfAClientAreLimited()
+{
+    const QByteArray wait =
+        R"({"jsonrpc":"2.0","id":%1,"method":"wait","params":{"control":"battery.voltage","value":7,"within":3600}})";
+    RawClient raw(bench->socketPath());
+    for (qsizetype number = 0; number < ControlSession::mostWaits; ++number)
+        raw.send(QByteArray(wait).replace("%1", QByteArray::number(number)) + '\n');
+    const auto refused = raw.ask(QByteArray(wait).replace("%1", "\"more\""));
+    QCOMPARE(refused.value("id"), "more");
+    QCOMPARE(errorCode(refused), -32001);
+    QCOMPARE(errorText(refused), "a client has at most 1000 waits under way");
+    bench->registry.publish(control, 7);
+    for (qsizetype number = 0; number < ControlSession::mostWaits; ++number)
+        QCOMPARE(raw.answer().value("result"), 7);
+    QCOMPARE(raw.ask(QByteArray(wait).replace("%1", "1")).value("result"), 7);
 }
 
 void ControlServerTest::logReturnsTheLinesAfterAMark()

@@ -19,6 +19,8 @@ namespace VirtualDevice
 /// LEFT and RIGHT are 0 to 60; WRITES counts the writes to the control since the file was made. The file is replaced as
 /// a whole with each write, so that a reader never sees half a line and may watch its directory for the change. No file
 /// means that nothing has been written yet: the card then stands at 0 0.
+///
+/// Threads: a value; any. The writer is the program's process, the reader the device's.
 struct MixerState
 {
     static constexpr long minimum = 0;

@@ -13,6 +13,8 @@ class Registry;
 class Screen;
 
 /// What the control socket gives access to. Everything in it outlives the server.
+///
+/// Threads: the main thread, where all of it lives.
 struct ControlContext
 {
     Registry& registry;

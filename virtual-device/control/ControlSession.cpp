@@ -296,6 +296,9 @@ ControlSession::Outcome ControlSession::wait(const JsonRpc::Request& request)
     const QJsonValue within = request.params.value("within");
     if (!within.isUndefined() && (!within.isDouble() || within.toDouble() < 0 || within.toDouble() > longestWait))
         return wrong(QStringLiteral("\"within\" takes 0..%1 seconds").arg(longestWait));
+    if (findChildren<PendingWait*>(QString(), Qt::FindDirectChildrenOnly).size() >= mostWaits)
+        return Error{ErrorCode::Unavailable, QStringLiteral("a client has at most %1 waits under way").arg(mostWaits),
+                     QJsonValue::Undefined};
     const double seconds = within.toDouble(usualWait);
     auto* const pending = new PendingWait(this);
     if (auto error = condition(*pending, request.params)) {

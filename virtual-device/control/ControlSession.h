@@ -32,6 +32,7 @@ class ControlSession : public QObject
 public:
     static constexpr qsizetype longestLine = 64 * 1024;
     static constexpr qint64 largestBacklog = 16 * 1024 * 1024;
+    static constexpr qsizetype mostWaits = 1000;
 
     ControlSession(QLocalSocket* client, const ControlContext& reached, QObject* parent);
 

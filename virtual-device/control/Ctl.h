@@ -14,7 +14,7 @@ namespace VirtualDevice
 /// status 0: done; 1: a wait did not come true in time; 2: wrong use, an unknown name, a value out of range, or no
 /// device to speak to.
 ///
-/// Needs an application object. `arguments` begin behind the word "ctl".
+/// Threads: the main thread. Needs an application object. `arguments` begin behind the word "ctl".
 [[nodiscard]] int runCtl(const QStringList& arguments);
 
 } // namespace VirtualDevice

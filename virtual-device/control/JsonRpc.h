@@ -22,7 +22,7 @@ namespace VirtualDevice::JsonRpc
 /// | -32601 | no such method; the text names those that there are            |
 /// | -32602 | a parameter is missing, unknown or out of range; the text says |
 /// | -32000 | a wait that did not come true in its time                      |
-/// | -32001 | not now: the screen is not connected                           |
+/// | -32001 | not now: the screen is not connected, or too many waits        |
 ///
 /// Threads: no state; any thread.
 enum class ErrorCode

@@ -21,7 +21,7 @@ namespace VirtualDevice
 /// - a second command while one awaits its acknowledgement. The wait ends with an ACK or NAK of the right length that
 ///   went to the program, or after `patience`, when the program has given it up.
 ///
-/// One thread.
+/// Threads: lives in the thread of its RadioModel.
 class RadioMonitor : public QObject
 {
     Q_OBJECT

@@ -25,6 +25,8 @@ enum class ControlAccess
 
 /// One row of the control table: everything that the command line, the help, the documentation and the checks know
 /// about a control.
+///
+/// Threads: a constant; any.
 struct ControlSpec
 {
     std::string_view name;
