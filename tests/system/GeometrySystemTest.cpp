@@ -215,6 +215,9 @@ void GeometrySystemTest::theKeysLieInTheirGrid()
         REQUIRE(device.tap(key));
     REQUIRE(device.waitControl("radio.amplifier", true));
     REQUIRE(device.waitControl("dsp.receiver", 1));
+    // Lit while the program commands the radio and the DSP, which answers before the label is white again.
+    for (const auto* const key : keys)
+        REQUIRE(device.waitRegion(QStringLiteral("key.%1").arg(QString::fromLatin1(key).toLower()), "white"));
     const QImage picture = device.screenshot();
     QRect all;
     for (const auto& label : std::as_const(labels)) {
