@@ -12,11 +12,11 @@
 #include <QSemaphore>
 
 #include <benchmark/benchmark.h>
-#include <ctime>
 
 #include <algorithm>
 #include <array>
 #include <cstdint>
+#include <ctime>
 #include <string>
 #include <utility>
 #include <vector>
