@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdlib>
+#include <system_error>
 #include <utility>
 
 namespace Utilities
@@ -76,7 +77,11 @@ LogWriter& LogWriter::instance()
 LogWriter::LogWriter()
 {
     const SignalsBlocked guard;
-    thread = std::thread([this] { run(); });
+    try {
+        thread = std::thread([this] { run(); });
+    } catch (const std::system_error&) {
+        // A machine without a thread left: every caller carries its own requests out.
+    }
     std::atexit([] { instance().finish(); });
 }
 
@@ -109,6 +114,10 @@ void LogWriter::submit(Request request)
     std::unique_lock lock(mutex);
     if (queue.size() >= capacity || finishing)
         return;
+    if (!thread.joinable()) {
+        request();
+        return;
+    }
     queue.push_back(std::move(request));
     const auto ticket = ++submitted;
     changed.notify_all();
@@ -161,6 +170,8 @@ void LogWriter::finish()
     changed.notify_all();
     const bool drained = changed.wait_for(lock, patience, [this] { return completed == submitted; });
     lock.unlock();
+    if (!thread.joinable())
+        return;
     if (drained)
         thread.join();
     else

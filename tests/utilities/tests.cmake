@@ -2,3 +2,4 @@
 # SPDX-License-Identifier: MIT
 immunityrig_test(DebugTest SOURCES utilities/DebugTest.cpp LIBRARIES Utilities LABELS unit)
 immunityrig_test(StandardErrorTest SOURCES utilities/StandardErrorTest.cpp LIBRARIES Utilities LABELS unit)
+immunityrig_test(LogThreadShortageTest SOURCES utilities/LogThreadShortageTest.cpp LIBRARIES Utilities LABELS unit)
