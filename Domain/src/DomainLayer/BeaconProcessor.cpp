@@ -208,6 +208,9 @@ void BeaconProcessor::PrivateData::sendNext()
 /// find the timer that it is to stop.
 bool BeaconProcessor::PrivateData::transmit(const QByteArray& message)
 {
+    // On a machine without a thread for the worker nothing could answer a caller that waits: the line is a dead one.
+    if (!workerThread.isRunning())
+        return false;
     const auto attempt = startAckTimer();
     if (protocol->sendMessage(message))
         return true;
@@ -302,7 +305,7 @@ BeaconProcessor::BeaconProcessor(SerialPort& serialPort) : data(std::make_unique
 {
     qRegisterMetaType<Error>("Domain::AbstractBeaconProcessor::Error");
     data->workerThread.start(QThread::HighPriority);
-    // Where the machine has no thread left, everything happens on the caller's, as long as that runs its event loop.
+    // Where the machine has no thread left, what the radio tells is handled on the caller's; commands are refused.
     if (data->workerThread.isRunning())
         moveToThread(&data->workerThread);
     connect(this, SIGNAL(threadStarted()), this, SLOT(createObjectsOnThread()));
