@@ -12,6 +12,7 @@
 #include <atomic>
 #include <climits>
 #include <csignal>
+#include <cstdlib>
 #include <memory>
 
 using Domain::DspPort;
@@ -59,7 +60,7 @@ private slots:
     {
         port.reset();
         InstantDsp::refuse();
-        InstantDsp::takeTerminationSignals();
+        InstantDsp::during();
         log.reset();
     }
 
@@ -84,12 +85,25 @@ private slots:
         const auto ownHandler = [](int) {};
         for (const int number : {SIGTERM, SIGINT})
             std::signal(number, ownHandler);
-        InstantDsp::takeTerminationSignals(call.constData());
+        InstantDsp::during(call.constData(), [] {
+            for (const int number : {SIGTERM, SIGINT})
+                std::signal(number, [](int) { std::_Exit(1); });
+        });
         QVERIFY(port->open(QIODevice::ReadWrite));
         for (const int number : {SIGTERM, SIGINT}) {
             const auto after = std::signal(number, SIG_DFL);
             QVERIFY(after == +ownHandler);
         }
+    }
+
+    /// The program's handler takes itself away at the first signal, so that a second one kills.
+    void aSignalDuringTheStartLeavesTheDefaultForTheSecond()
+    {
+        std::signal(SIGTERM, [](int number) { std::signal(number, SIG_DFL); });
+        InstantDsp::during("PROC_attach", [] { std::raise(SIGTERM); });
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        const auto after = std::signal(SIGTERM, SIG_DFL);
+        QVERIFY(after == SIG_DFL);
     }
 
     void closingIsFiveCallsInOrder()

@@ -12,9 +12,7 @@
 #include <atomic>
 #include <chrono>
 #include <condition_variable>
-#include <csignal>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <mutex>
 
@@ -88,7 +86,8 @@ struct Record
     // The port's own thread asks for messages.
     std::atomic<std::size_t> fetches = 0;
     std::atomic<const char*> refused = "";
-    const char* takesSignals = "";
+    const char* eventful = "";
+    void (*happens)() = nullptr;
 };
 
 Record record;
@@ -114,9 +113,8 @@ DSP_STATUS called(DSP_STATUS result, const char* name, const char* format, Argum
             static_cast<std::size_t>(std::snprintf(text + length, longestCall - length, format, arguments...));
         std::snprintf(text + length + rest, longestCall - length - rest, ")");
     }
-    if (std::strcmp(name, record.takesSignals) == 0)
-        for (const int number : {SIGTERM, SIGINT})
-            std::signal(number, [](int) { std::_Exit(1); });
+    if (record.happens != nullptr && std::strcmp(name, record.eventful) == 0)
+        record.happens();
     return isRefused(name) ? static_cast<DSP_STATUS>(TestSupport::InstantDsp::refusal) : result;
 }
 
@@ -149,9 +147,10 @@ std::size_t TestSupport::InstantDsp::fetches()
     return record.fetches;
 }
 
-void TestSupport::InstantDsp::takeTerminationSignals(const char* call)
+void TestSupport::InstantDsp::during(const char* call, void (*happens)())
 {
-    record.takesSignals = call;
+    record.eventful = call;
+    record.happens = happens;
 }
 
 void TestSupport::InstantDsp::refuse(const char* call)

@@ -29,9 +29,8 @@ void deliver(const QByteArray& data, std::uint16_t id = 100);
 /// How often the program has asked for a message.
 [[nodiscard]] std::size_t fetches();
 
-/// From now on this call, one that is kept, sets handlers of its own for the termination signals, as the device's
-/// library does in a process that attaches; no name: none does. The name must last.
-void takeTerminationSignals(const char* call = "");
+/// What happens during this call, one that is kept, from now on; no name: nothing. The name must last.
+void during(const char* call = "", void (*happens)() = nullptr);
 
 /// From now on the call of this name, one that is kept or MSGQ_get, gives `refusal` and has no effect; no name: none
 /// does. The name must last.

@@ -60,6 +60,7 @@ constexpr Uint16 incomingMessageId = 100;
 constexpr int getTimeout = 500;        // ms
 constexpr int threadEndTimeout = 5000; // ms
 constexpr qsizetype fullAbove = 100;
+constexpr qsizetype emptiedBelow = 31;
 
 /// The program ends in order on a termination signal. The device's library sets handlers of its own when a process
 /// attaches, which end it wherever it is: what was set before comes back, and the link is closed by the port.
@@ -73,8 +74,15 @@ public:
     }
     ~TerminationActionsKept()
     {
-        for (const Action& action : actions)
-            sigaction(action.signal, &action.before, nullptr);
+        for (const Action& action : actions) {
+            struct sigaction now
+            {
+            };
+            sigaction(action.signal, nullptr, &now);
+            // The program's own handler leaves the default behind: the first signal has come, and a second must kill.
+            if (now.sa_handler != SIG_DFL)
+                sigaction(action.signal, &action.before, nullptr);
+        }
     }
     TerminationActionsKept(const TerminationActionsKept&) = delete;
     TerminationActionsKept& operator=(const TerminationActionsKept&) = delete;
@@ -87,7 +95,6 @@ private:
     };
     std::array<Action, 2> actions{{{SIGTERM, {}}, {SIGINT, {}}}};
 };
-constexpr qsizetype emptiedBelow = 31;
 
 /// DSPLink's result codes are negative numbers when they fail; logs show the 32 bits.
 QString hexadecimal(DSP_STATUS status)
