@@ -24,7 +24,7 @@ constexpr std::size_t maximumQueues = 16;
 constexpr std::size_t maximumWaitingMessages = 1024;
 constexpr std::uint32_t replyTimeout = 5000;
 /// At the end nobody has five seconds left: the whole program is to be down within three.
-constexpr std::uint32_t closingReplyTimeout = 1000;
+constexpr std::uint32_t closingReplyTimeout = 500;
 
 bool isReadableFile(const char* path)
 {

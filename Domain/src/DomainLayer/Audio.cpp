@@ -47,7 +47,7 @@ constexpr int defaultVolume = 3;
 constexpr int mixerLevelsPerStep = 10;
 
 /// A healthy device plays what it has been given, three buffers at most.
-constexpr std::chrono::seconds longestClose{1};
+constexpr std::chrono::milliseconds longestClose{800};
 
 constexpr int sampleRate = 16000;
 constexpr Uint16 samplesPerBuffer = 4096;

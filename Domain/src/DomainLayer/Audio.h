@@ -31,7 +31,7 @@ namespace Domain
 /// Threads: the object lives on a thread of its own, which loads the sounds; SDL's audio thread takes the samples.
 /// `play`, `pause`, `resume`, `stop` and `isPlaying` may be called from any thread, `volume` and `setVolume` from
 /// the thread of the settings, which must outlive the object. The destructor waits for a load that is under way, and
-/// a second for the device to close; one that takes no samples any more is left to itself and to the end of the
+/// 0.8 s for the device to close; one that takes no samples any more is left to itself and to the end of the
 /// process. SDL is one for the whole process: there is one object of this class at a time, and none after such an end.
 class Audio : public AbstractAudio
 {
