@@ -78,6 +78,7 @@ void writeFile(const QString& path, const QByteArray& content);
 /// A file of eight megabytes without a line end: larger than what any region may read at a time.
 void writeEndlessLine(const QString& path, const QByteArray& begin);
 inline constexpr qint64 mostRead = 5 << 20;
+inline constexpr qint64 mostReadOfAWord = 64 << 10; ///< where a word or two decide, and by chance other files are read
 /// Removes a file, a link or a folder with everything in it.
 void removePath(const QString& path);
 
