@@ -135,6 +135,7 @@ void EndSystemTest::terminationSignalEndsTheProgramInOrder_data()
     row("DSP that is lost", {}, "dsp.presence", "missing");
     row("no sound card", {"audio.presence=missing"});
     row("broken card", {}, "sd.fault", "EIO");
+    row("nobody answers any more", {"radio.ack=off", "dsp.ack=off", "sd.fault=EIO"}, "dsp.replies", false);
     row("nothing at all", {"rtc.fault=ENOENT", "usb.hid=off", "sd.present=off", "radio.presence=missing",
                            "dsp.presence=missing", "audio.presence=missing"});
 }
