@@ -243,8 +243,10 @@ void Connection::serve()
         waits[0].events = eventsToWaitFor();
         if (::poll(waits.data(), waits.size(), -1) < 0 && errno != EINTR)
             break;
-        std::uint64_t count = 0;
-        [[maybe_unused]] const auto drained = ::read(wakeUp, &count, sizeof count);
+        if ((waits[1].revents & POLLIN) != 0) {
+            std::uint64_t count = 0;
+            [[maybe_unused]] const auto drained = ::read(wakeUp, &count, sizeof count);
+        }
         {
             const std::lock_guard lock(mutex);
             if (closing)
