@@ -125,6 +125,12 @@ bool DeviceUnderTest::tap(const QString& key)
     return press(key) && release(key);
 }
 
+bool DeviceUnderTest::strike(const QString& key, const QString& region)
+{
+    return press(key) && waitRegion(region, QStringLiteral("green")) && release(key) &&
+           waitRegion(region, QStringLiteral("white"));
+}
+
 bool DeviceUnderTest::hold(const QString& key, std::chrono::milliseconds duration)
 {
     return call("hold", {{"key", key}, {"milliseconds", qint64(duration.count())}}).isOk();

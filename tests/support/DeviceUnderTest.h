@@ -17,6 +17,9 @@
 #include <chrono>
 #include <optional>
 
+/// A step that the rest of a test function stands on. The device that it speaks to is called `device`.
+#define REQUIRE(step) QVERIFY2(step, qPrintable(device.error() + '\n' + device.output()))
+
 namespace TestSupport
 {
 
@@ -28,9 +31,9 @@ namespace TestSupport
 /// Everything that can fail returns false, and `error()` says why:
 ///
 ///     DeviceUnderTest device;
-///     QVERIFY2(device.start(), qPrintable(device.error()));
-///     QVERIFY2(device.set("usb.hid", false), qPrintable(device.error()));
-///     QVERIFY2(device.waitRegion("usb-device", "red"), qPrintable(device.error()));
+///     REQUIRE(device.start());
+///     REQUIRE(device.set("usb.hid", false));
+///     REQUIRE(device.waitRegion("usb-device", "red"));
 ///
 /// Threads: the test's own, which runs its event loop while it waits. Needs an application object.
 class DeviceUnderTest
@@ -64,6 +67,9 @@ public:
     [[nodiscard]] bool press(const QString& key);
     [[nodiscard]] bool release(const QString& key);
     [[nodiscard]] bool tap(const QString& key);
+    /// Presses until the key's label is green, and releases until it is white: the program has done all that the key
+    /// stands for.
+    [[nodiscard]] bool strike(const QString& key, const QString& region);
     [[nodiscard]] bool hold(const QString& key, std::chrono::milliseconds duration);
 
     // Regions as in `VirtualDevice::RegionMap`; colours: green, red, white, other, none.

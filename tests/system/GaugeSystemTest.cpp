@@ -11,8 +11,6 @@ using TestSupport::DeviceUnderTest;
 using TestSupport::ScreenHealth;
 using TestSupport::ScreenText;
 
-#define REQUIRE(call) QVERIFY2(call, qPrintable(device.error()))
-
 namespace
 {
 

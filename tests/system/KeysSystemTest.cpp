@@ -7,8 +7,6 @@
 
 using TestSupport::DeviceUnderTest;
 
-#define REQUIRE(call) QVERIFY2(call, qPrintable(device.error()))
-
 /// Every key of the keypad, on the screen, on the power latch, and at the radio and the DSP that it drives.
 class KeysSystemTest : public QObject
 {

@@ -11,8 +11,6 @@ using TestSupport::DeviceUnderTest;
 using TestSupport::ScreenHealth;
 using TestSupport::ScreenText;
 
-#define REQUIRE(call) QVERIFY2(call, qPrintable(device.error() + '\n' + device.output()))
-
 namespace
 {
 
@@ -78,10 +76,7 @@ void RadioPanelSystemTest::walkChannels(DeviceUnderTest& device)
                                std::pair("Down", "2402 MHz"), std::pair("Down", "2402 MHz")};
     for (const auto& [key, text] : steps) {
         const QString label = QStringLiteral("key.%1").arg(QString::fromLatin1(key).toLower());
-        REQUIRE(device.press(key));
-        REQUIRE(device.waitRegion(label, "green"));
-        REQUIRE(device.release(key));
-        REQUIRE(device.waitRegion(label, "white"));
+        REQUIRE(device.strike(key, label));
         QVERIFY2(shows(device, frequencyValue, text), text);
     }
 }
@@ -94,10 +89,7 @@ void RadioPanelSystemTest::walkLevels(DeviceUnderTest& device)
                                std::pair("Left", "-18 dBm"),  std::pair("Left", "-18 dBm")};
     for (const auto& [key, text] : steps) {
         const QString label = QStringLiteral("key.%1").arg(QString::fromLatin1(key).toLower());
-        REQUIRE(device.press(key));
-        REQUIRE(device.waitRegion(label, "green"));
-        REQUIRE(device.release(key));
-        REQUIRE(device.waitRegion(label, "white"));
+        REQUIRE(device.strike(key, label));
         QVERIFY2(shows(device, powerValue, text), text);
     }
 }
@@ -105,10 +97,7 @@ void RadioPanelSystemTest::walkLevels(DeviceUnderTest& device)
 void RadioPanelSystemTest::switchAntenna(DeviceUnderTest& device)
 {
     for (const auto& [text, receiver] : {std::pair("External RF", 2), std::pair("Internal RF", 1)}) {
-        REQUIRE(device.press("Soft3"));
-        REQUIRE(device.waitRegion("key.soft3", "green"));
-        REQUIRE(device.release("Soft3"));
-        REQUIRE(device.waitRegion("key.soft3", "white"));
+        REQUIRE(device.strike("Soft3", "key.soft3"));
         QVERIFY2(shows(device, radiosLabel, text), text);
         REQUIRE(device.waitControl("dsp.receiver", receiver));
     }
@@ -132,12 +121,8 @@ void RadioPanelSystemTest::stopAndStart(DeviceUnderTest& device)
 void RadioPanelSystemTest::checkKeysWithoutText(DeviceUnderTest& device)
 {
     for (const auto& [key, region] : {std::pair("F5", "key.soft1"), std::pair("F6", "key.soft2"),
-                                      std::pair("F12", "key.power"), std::pair("Escape", "key.unknown")}) {
-        REQUIRE(device.press(key));
-        REQUIRE(device.waitRegion(region, "green"));
-        REQUIRE(device.release(key));
-        REQUIRE(device.waitRegion(region, "white"));
-    }
+                                      std::pair("F12", "key.power"), std::pair("Escape", "key.unknown")})
+        REQUIRE(device.strike(key, region));
 }
 
 void RadioPanelSystemTest::everyKeyChangesWhatThePanelShows_data()

@@ -14,8 +14,6 @@
 using TestSupport::DeviceUnderTest;
 using VirtualDevice::ControlClient;
 
-#define REQUIRE(call) QVERIFY2(call, qPrintable(device.error()))
-
 namespace
 {
 

@@ -12,8 +12,6 @@ using TestSupport::DeviceUnderTest;
 using TestSupport::ScreenHealth;
 using TestSupport::ScreenText;
 
-#define REQUIRE(call) QVERIFY2(call, qPrintable(device.error()))
-
 namespace
 {
 

@@ -10,8 +10,6 @@
 using TestSupport::DeviceUnderTest;
 using TestSupport::ScreenHealth;
 
-#define REQUIRE(call) QVERIFY2(call, qPrintable(device.error()))
-
 namespace
 {
 

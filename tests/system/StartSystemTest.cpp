@@ -16,8 +16,6 @@ using TestSupport::DeviceUnderTest;
 using TestSupport::ScreenHealth;
 using namespace std::chrono_literals;
 
-#define REQUIRE(call) QVERIFY2(call, qPrintable(device.error() + '\n' + device.output()))
-
 namespace
 {
 
