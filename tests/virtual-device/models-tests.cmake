@@ -4,6 +4,7 @@ immunityrig_test(RadioFrameTest SOURCES virtual-device/RadioFrameTest.cpp LIBRAR
 immunityrig_test(LineDamageTest SOURCES virtual-device/LineDamageTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(RadioModelTest SOURCES virtual-device/RadioModelTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(RadioLineTest SOURCES virtual-device/RadioLineTest.cpp LIBRARIES VirtualDevice LABELS unit)
+immunityrig_test(ExactTimerTest SOURCES virtual-device/ExactTimerTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(RateTimerTest SOURCES virtual-device/RateTimerTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(DspCodecTest SOURCES virtual-device/DspCodecTest.cpp LIBRARIES VirtualDevice LABELS unit)
 immunityrig_test(DspModelTest SOURCES virtual-device/DspModelTest.cpp LIBRARIES VirtualDevice LABELS unit)

@@ -17,8 +17,8 @@ namespace
 {
 
 constexpr auto byteTime = std::chrono::nanoseconds(1s) / RadioProtocol::bytesPerSecond;
-constexpr auto shortestWait = 1ms;
-constexpr auto longestWait = 4ms;    // a UART's FIFO is emptied about as often
+constexpr auto longestWait = 4ms; // a UART's FIFO is emptied about as often
+constexpr auto splitWait = 1ms;
 constexpr auto mergeHold = 100ms;    // long enough to gather several frames
 constexpr int longestSplitPiece = 3; // cuts every frame in the middle of its header
 
@@ -27,9 +27,7 @@ constexpr int longestSplitPiece = 3; // cuts every frame in the middle of its he
 LineDirection::LineDirection(Registry& controls, const QString& controlPrefix, quint32 seedSalt, QObject* parent)
     : QObject(parent), registry(controls), prefix(controlPrefix), salt(seedSalt), releaseTimer(this), burstTimer(this)
 {
-    releaseTimer.setSingleShot(true);
-    releaseTimer.setTimerType(Qt::PreciseTimer);
-    connect(&releaseTimer, &QTimer::timeout, this, &LineDirection::release);
+    connect(&releaseTimer, &ExactTimer::timeout, this, &LineDirection::release);
     connect(&burstTimer, &QTimer::timeout, this, &LineDirection::burst);
     connect(&registry, &Registry::changed, this, &LineDirection::controlChanged);
 }
@@ -103,8 +101,8 @@ void LineDirection::arm()
     if (manner == u"merge")
         wait = std::max<std::chrono::nanoseconds>(wait, mergeHold);
     else
-        wait = std::min<std::chrono::nanoseconds>(wait, manner == u"split" ? shortestWait : longestWait);
-    releaseTimer.start(std::max(shortestWait, std::chrono::ceil<std::chrono::milliseconds>(wait)));
+        wait = std::clamp<std::chrono::nanoseconds>(wait, byteTime, longestWait);
+    releaseTimer.start(manner == u"split" ? splitWait : wait);
 }
 
 void LineDirection::release()

@@ -3,6 +3,7 @@
 
 #pragma once
 
+#include "virtual-device/device/ExactTimer.h"
 #include "virtual-device/radio/LineDamage.h"
 
 #include <QByteArray>
@@ -60,7 +61,7 @@ private:
     LineDamage damage;
     QByteArray queue;
     Clock::time_point lineTime; ///< when the last byte that was released had passed
-    QTimer releaseTimer;
+    ExactTimer releaseTimer;
     QTimer burstTimer;
 };
 
