@@ -35,12 +35,17 @@ void setAction(void (*handler)(int))
     sigaction(SIGINT, &action, nullptr);
 }
 
-/// Calls nothing but what a signal handler may call.
-void requestEnd(int /*signal*/)
+/// Calls nothing but what a signal handler may call. The second signal comes here only where somebody has put this
+/// handler back meanwhile, and kills all the same: its own turn comes when this call has returned.
+void requestEnd(int signal)
 {
     const int savedErrno = errno;
     setAction(SIG_DFL);
-    endRequested = true;
+    if (endRequested.exchange(true)) {
+        ::raise(signal);
+        errno = savedErrno;
+        return;
+    }
     const char byte = 1;
     [[maybe_unused]] const auto written = ::write(pipeInput.load(), &byte, 1);
     errno = savedErrno;

@@ -74,15 +74,8 @@ public:
     }
     ~TerminationActionsKept()
     {
-        for (const Action& action : actions) {
-            struct sigaction now
-            {
-            };
-            sigaction(action.signal, nullptr, &now);
-            // The program's own handler leaves the default behind: the first signal has come, and a second must kill.
-            if (now.sa_handler != SIG_DFL)
-                sigaction(action.signal, &action.before, nullptr);
-        }
+        for (const Action& action : actions)
+            sigaction(action.signal, &action.before, nullptr);
     }
     TerminationActionsKept(const TerminationActionsKept&) = delete;
     TerminationActionsKept& operator=(const TerminationActionsKept&) = delete;
