@@ -15,7 +15,8 @@ namespace Utilities
 /// in the order of the calls, as long as the service takes messages. A service that takes none (nobody reads
 /// `/dev/log`, or standard error is a pipe that is full), or takes them slowly, holds the callers up for at most a
 /// quarter of a second in all: after that messages wait in a bounded queue, and the ones that find it full are lost. A
-/// disturbed log must not stop the bench.
+/// disturbed log must not stop the bench. Only on a machine that has no thread left for the log does it hold up whoever
+/// logs.
 ///
 /// Format: the text itself is the `syslog` format, so `%m` and `%%` expand and any other conversion is an error of
 /// the caller. Text that comes from outside (a peer, a file, a file name) goes through `literal()` first.

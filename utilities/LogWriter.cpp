@@ -76,13 +76,20 @@ LogWriter& LogWriter::instance()
 
 LogWriter::LogWriter()
 {
+    std::atexit([] { instance().finish(); });
+}
+
+bool LogWriter::hasThread()
+{
+    if (thread.joinable())
+        return true;
     const SignalsBlocked guard;
     try {
         thread = std::thread([this] { run(); });
+        return true;
     } catch (const std::system_error&) {
-        // A machine without a thread left: every caller carries its own requests out.
+        return false;
     }
-    std::atexit([] { instance().finish(); });
 }
 
 void LogWriter::open(const char* identity, int options, int facility)
@@ -114,7 +121,8 @@ void LogWriter::submit(Request request)
     std::unique_lock lock(mutex);
     if (queue.size() >= capacity || finishing)
         return;
-    if (!thread.joinable()) {
+    if (!hasThread()) {
+        lock.unlock();
         request();
         return;
     }

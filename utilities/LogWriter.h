@@ -17,7 +17,8 @@ namespace Utilities
 {
 
 /// Carries log messages to `syslog`, and other lines to standard error, on a thread of its own, so that a reader which
-/// takes nothing blocks that thread and nobody else.
+/// takes nothing blocks that thread and nobody else. As long as the machine has no thread left for it, each caller
+/// carries its own requests out, however long that takes.
 ///
 /// Threads: every operation may be called from any thread. Each waits until its request has been carried out, but all
 /// callers together wait at most `patience` for a service that hangs, or that is slow (`quick` or longer for each of
@@ -54,6 +55,8 @@ private:
     ~LogWriter() = default;
 
     void submit(Request request);
+    /// Starts the thread if there is none; false on a machine that has none to give. Under the mutex.
+    [[nodiscard]] bool hasThread();
     void run();
     void finish();
     void judgeBy(std::chrono::nanoseconds lastRequest);

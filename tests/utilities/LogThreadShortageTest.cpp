@@ -17,6 +17,7 @@ namespace
 
 std::atomic<bool> hasThreads = true;
 std::atomic<int> refused = 0;
+std::atomic<int> started = 0;
 
 } // namespace
 
@@ -25,13 +26,15 @@ extern "C" int pthread_create(pthread_t* thread, const pthread_attr_t* attribute
 {
     using Function = int (*)(pthread_t*, const pthread_attr_t*, void* (*)(void*), void*);
     static const auto real = reinterpret_cast<Function>(::dlsym(RTLD_NEXT, "pthread_create"));
-    if (hasThreads)
+    if (hasThreads) {
+        ++started;
         return real(thread, attributes, start, argument);
+    }
     ++refused;
     return EAGAIN;
 }
 
-/// The log on a machine that has no thread left for its writer.
+/// The log on a machine that has no thread left for its writer, at first.
 class LogThreadShortageTest : public QObject
 {
     Q_OBJECT
@@ -43,6 +46,9 @@ private slots:
         Utilities::Debug::info(QStringLiteral("before anybody listens"));
         hasThreads = true;
         QCOMPARE(refused.load(), 1);
+        const int before = started;
+        Utilities::Debug::info(QStringLiteral("with threads again"));
+        QCOMPARE(started - before, 1);
         const TestSupport::LogCapture log;
         Utilities::Debug::info(QStringLiteral("first"));
         Utilities::Debug::debugBrief(QStringLiteral("second"));
