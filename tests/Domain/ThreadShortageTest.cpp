@@ -19,7 +19,6 @@
 using TestSupport::DspPeer;
 using TestSupport::LogCapture;
 using TestSupport::Radio;
-using TestSupport::RadioPeer;
 using TestSupport::sourcedTexts;
 
 namespace
@@ -85,6 +84,8 @@ void ThreadShortageTest::beaconProcessorWithoutItsThreadRefusesCommandsAndHearsT
     Radio radio;
     QCOMPARE(refusals.load(), 0);
     QCOMPARE(radio.processor.thread(), QThread::currentThread());
+    QVERIFY(sourcedTexts(*log).contains(
+        QStringLiteral("BeaconProcessor: No thread for the radio's answers: every command is refused")));
     // Whoever waits for an accepted command does so without the event loop, in which alone the answer could be handled.
     QVERIFY(!radio.processor.sendPing());
     QVERIFY(radio.processor.isCommandPending());

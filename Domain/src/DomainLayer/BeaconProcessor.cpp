@@ -305,9 +305,10 @@ BeaconProcessor::BeaconProcessor(SerialPort& serialPort) : data(std::make_unique
 {
     qRegisterMetaType<Error>("Domain::AbstractBeaconProcessor::Error");
     data->workerThread.start(QThread::HighPriority);
-    // Where the machine has no thread left, what the radio tells is handled on the caller's; commands are refused.
     if (data->workerThread.isRunning())
         moveToThread(&data->workerThread);
+    else
+        warn(__LINE__, QStringLiteral("No thread for the radio's answers: every command is refused"));
     connect(this, SIGNAL(threadStarted()), this, SLOT(createObjectsOnThread()));
     emit threadStarted();
     // A command may follow at once, and needs the objects.

@@ -16,10 +16,11 @@ class SerialPort;
 /// Drives the radio microcontroller over its serial line: one command in flight, the others queued in order, each
 /// waiting for its acknowledgement for 3 seconds at the most and never repeated.
 ///
-/// Threads: made and destroyed on one thread, lives on a worker thread of its own, or on its maker's where the machine
-/// starts no other. Operations may be called from any thread: a command that finds none in flight is written by its
-/// caller. Replies are handled on the worker thread, and all signals are emitted there. The constructor opens the port
-/// and resets the microcontroller before it returns; the destructor ends the worker thread and leaves the port open.
+/// Threads: made and destroyed on one thread, lives on a worker thread of its own. Operations may be called from any
+/// thread: a command that finds none in flight is written by its caller. Replies are handled on the worker thread, and
+/// all signals are emitted there. The constructor opens the port and resets the microcontroller before it returns; the
+/// destructor ends the worker thread and leaves the port open. Where the machine starts no thread for it (logged once),
+/// it lives on its maker's, hears what the radio says there, and lets no command leave, as on a dead line.
 ///
 /// Messages are a code byte and data, multi-byte fields big-endian; `Frame` is what carries them on the line.
 ///
