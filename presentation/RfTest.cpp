@@ -74,10 +74,15 @@ struct RfTest::PrivateData
     {
     }
 
+    // A full line keeps a command's writer for half a second, and the DSP's commands wait up to 0.8 s for their answer:
+    // a program that is to end gives none.
+
     /// Sends a command and takes note of its result: a refused one leaves the pending flag set with nobody to clear it.
     template <typename... Parameters, typename... Arguments>
     void send(bool (AbstractBeaconProcessor::*command)(Parameters...), Arguments... arguments)
     {
+        if (TerminationSignals::isEndRequested())
+            return;
         if (!waitLimit.isForever() && !beaconProcessor.isCommandPending())
             waitLimit = QDeadlineTimer::Forever;
         if ((beaconProcessor.*command)(arguments...))
@@ -93,7 +98,6 @@ struct RfTest::PrivateData
         wait();
     }
 
-    /// The DSP's commands wait, too, up to 0.8 s each. A program that is to end gives none.
     void send(bool (Domain::AbstractDsp::*command)(qint32), qint32 argument)
     {
         if (!TerminationSignals::isEndRequested())

@@ -24,7 +24,7 @@ constexpr std::size_t maximumQueues = 16;
 constexpr std::size_t maximumWaitingMessages = 1024;
 constexpr std::uint32_t replyTimeout = 5000;
 /// At the end nobody has five seconds left: the whole program is to be down within three.
-constexpr std::uint32_t closingReplyTimeout = 500;
+constexpr std::uint32_t closingReplyTimeout = 300;
 
 bool isReadableFile(const char* path)
 {
@@ -240,10 +240,13 @@ DSP_STATUS Link::openQueue(const char* name, MSGQ_Queue* queue)
         *queue = queueHandle(number);
         return DSP_SOK;
     }
-    const std::lock_guard lock(mutex);
-    dropMessages(queues[number]);
-    queues.erase(number);
-    giveBuffers();
+    {
+        const std::lock_guard lock(mutex);
+        dropMessages(queues[number]);
+        queues.erase(number);
+        giveBuffers();
+    }
+    changed.notify_all();
     return status;
 }
 

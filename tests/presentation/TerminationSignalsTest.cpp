@@ -8,6 +8,8 @@
 #include <QTest>
 
 #include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <csignal>
 
@@ -72,6 +74,27 @@ private slots:
         QCOMPARE(QCoreApplication::exec(), 0);
     }
 
+    /// As after a library's call that has saved the actions before the first signal and restores them after it.
+    void theSecondSignalKillsAlsoWhereTheHandlerIsBack()
+    {
+        const TerminationSignals signalsOfTheProgram;
+        struct sigaction saved
+        {
+        };
+        sigaction(SIGTERM, nullptr, &saved);
+        const pid_t program = ::fork();
+        if (program == 0) {
+            std::raise(SIGTERM);
+            sigaction(SIGTERM, &saved, nullptr);
+            std::raise(SIGTERM);
+            ::_exit(0);
+        }
+        int status = 0;
+        QCOMPARE(::waitpid(program, &status, 0), program);
+        QVERIFY(WIFSIGNALED(status));
+        QCOMPARE(WTERMSIG(status), SIGTERM);
+    }
+
     void withoutAPipeTheFirstSignalKills()
     {
         const NoDescriptors noDescriptors;
@@ -91,18 +114,20 @@ private slots:
                 std::raise(SIGTERM);
         };
         panel.test.start();
-        QCOMPARE(panel.taken(), Journal({"amplifier on", "start 2 0"}));
+        QCOMPARE(panel.taken(), Journal({"amplifier on"}));
         QCOMPARE(panel.beacon.looks, 100);
-        QCOMPARE(panel.afterCalling(&RfTest::frequencyUp), Journal({"stop", "start 40 0"}));
+        QCOMPARE(panel.afterCalling(&RfTest::frequencyUp), Journal{});
         QCOMPARE(panel.beacon.looks, 100);
     }
 
-    void afterASignalTheDspIsAskedForNothing()
+    void afterASignalNothingIsCommandedAnyMore()
     {
         const TerminationSignals signalsOfTheProgram;
         Panel panel;
         std::raise(SIGTERM);
         QCOMPARE(panel.afterCalling(&RfTest::toggleExternalAntenna), Journal{});
+        QCOMPARE(panel.afterCalling(&RfTest::toggleState), Journal{});
+        QCOMPARE(panel.afterCalling(&RfTest::sendPing), Journal{});
         QCOMPARE(panel.text("labelRadios"), QStringLiteral("External RF"));
     }
 };

@@ -46,7 +46,7 @@ constexpr int maximumVolume = 6;
 constexpr int defaultVolume = 3;
 constexpr int mixerLevelsPerStep = 10;
 
-/// A healthy device plays what it has been given, three buffers at most.
+/// A healthy device plays what it has been given, three buffers (768 ms) at most.
 constexpr std::chrono::milliseconds longestClose{800};
 
 constexpr int sampleRate = 16000;
