@@ -15,6 +15,7 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <semaphore>
 #include <thread>
 
 using DataSource::AbstractFileStore;
@@ -35,7 +36,36 @@ QString warning(int line, const QString& text)
 
 const QString noInformation = QStringLiteral("Unable to obtain file system information");
 
+std::atomic<bool> holdsNext = false;
+std::binary_semaphore held(0);
+std::binary_semaphore letGo(0);
+
+/// Keeps the next scan where it reads the directory; what reads it on the test's own thread, or later, goes on.
+class ScanHold
+{
+public:
+    ScanHold() { holdsNext = true; }
+    ~ScanHold() { letGo.release(); }
+    ScanHold(const ScanHold&) = delete;
+    ScanHold& operator=(const ScanHold&) = delete;
+
+    /// Returns when the scan is there.
+    void await() { held.acquire(); }
+};
+
 } // namespace
+
+extern "C" dirent64* readdir64(DIR* directory)
+{
+    using Function = dirent64* (*)(DIR*);
+    static const auto real = reinterpret_cast<Function>(TestSupport::nextSymbol("readdir64"));
+    static const auto ownThread = std::this_thread::get_id();
+    if (std::this_thread::get_id() != ownThread && holdsNext.exchange(false)) {
+        held.release();
+        letGo.acquire();
+    }
+    return real(directory);
+}
 
 /// Counting, space, and the rules of who may run when; deletion and paging have programs of their own.
 class FileStoreTest : public FileStoreFixture
@@ -62,7 +92,9 @@ private slots:
     void stoppedScanStoresWhatItHasCounted();
     void stoppedScanFillsTheCacheAnew();
     void scanAfterAStoppedOneReportsOnceAndCountsAll();
+    void scanWaitsForTheEndOfAStoppedOne();
     void deletionAfterAStoppedScanHappensAfterIt();
+    void deletionWaitsForTheEndOfAStoppedScan();
     void stopWithoutAScanDoesNothing();
     void createFileNamesAFileAndCreatesNothing();
     void spaceIsTheFileSystems();
@@ -364,6 +396,25 @@ void FileStoreTest::scanAfterAStoppedOneReportsOnceAndCountsAll()
     QCOMPARE(loggedTexts(log()), QStringList());
 }
 
+/// Else its counts could be overwritten by those of the stopped one.
+void FileStoreTest::scanWaitsForTheEndOfAStoppedOne()
+{
+    makeFiles(50, 1);
+    FileStore store(directory());
+    const QSignalSpy complete(&store, &AbstractFileStore::scanComplete);
+    {
+        ScanHold hold;
+        store.rescan();
+        hold.await();
+        store.stopScanning();
+        store.rescan();
+        QTest::qWait(100);
+        QCOMPARE(complete.count(), 0);
+    }
+    QTRY_COMPARE(complete.count(), 1);
+    QCOMPARE(store.count(), 50);
+}
+
 void FileStoreTest::deletionAfterAStoppedScanHappensAfterIt()
 {
     makeFiles(50, 1);
@@ -381,6 +432,24 @@ void FileStoreTest::deletionAfterAStoppedScanHappensAfterIt()
     // The stopped scan has seen nothing, and the deletion found nothing to subtract from.
     QCOMPARE(store.count(), 0);
     QCOMPARE(store.bytesUsed(), 0);
+}
+
+void FileStoreTest::deletionWaitsForTheEndOfAStoppedScan()
+{
+    makeFiles(50, 1);
+    FileStore store(directory());
+    const QSignalSpy deleted(&store, &AbstractFileStore::deleteComplete);
+    {
+        ScanHold hold;
+        store.rescan();
+        hold.await();
+        store.stopScanning();
+        store.deleteFile(0);
+        QTest::qWait(100);
+        QCOMPARE(listing().size(), 50);
+    }
+    QTRY_COMPARE(deleted.count(), 1);
+    QCOMPARE(listing().size(), 49);
 }
 
 void FileStoreTest::stopWithoutAScanDoesNothing()

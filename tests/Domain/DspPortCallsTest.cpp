@@ -164,6 +164,13 @@ private slots:
         QCOMPARE(TestSupport::sourcedTexts(*log, TestSupport::Priorities::Shown), expected);
     }
 
+    void messagesAreWaitedForHalfASecondAtATime()
+    {
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        QTRY_VERIFY(InstantDsp::fetches() > 0);
+        QCOMPARE(InstantDsp::fetchTimeout(), 500U);
+    }
+
     void aRefusedFetchIsRepeatedTwiceASecondAtMost()
     {
         InstantDsp::refuse("MSGQ_get");

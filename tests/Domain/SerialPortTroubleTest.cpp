@@ -4,6 +4,7 @@
 #include "Domain/src/DomainLayer/SerialPort.h"
 #include "tests/Domain/SerialLine.h"
 #include "tests/support/LogCapture.h"
+#include "tests/support/ProcessorTime.h"
 #include "utilities/Debug.h"
 
 #include <QCoreApplication>
@@ -108,6 +109,7 @@ private slots:
     void anInterruptedWriteHasAllItsPatience();
     void aLineThatHangsUpIsSilentAndCostsNoProcessor();
     void aFileInPlaceOfALineCostsNoProcessor();
+    void aLineWhoseReadsFailIsSilentAndCostsNoProcessor();
     void theLineNeverBecomesTheControllingTerminal();
     void anUnreadLineWaitsInTheDriverAndLosesNothing();
     void theBufferMayBeWatchedFromAnotherThread();
@@ -248,6 +250,19 @@ void SerialPortTroubleTest::aFileInPlaceOfALineCostsNoProcessor()
     const auto before = processorTime(reader.handle);
     QTest::qWait(1000);
     QVERIFY(processorTime(reader.handle) - before < std::chrono::milliseconds(100));
+    port.close();
+    QCOMPARE(log->texts(), QStringList());
+}
+
+/// The memory of a process is always ready, and at its address 0 there is nothing.
+void SerialPortTroubleTest::aLineWhoseReadsFailIsSilentAndCostsNoProcessor()
+{
+    SerialPort port("/proc/self/mem", SerialPort::Baud115200);
+    QVERIFY(port.open(QIODevice::ReadOnly));
+    const double before = TestSupport::processSeconds();
+    QTest::qWait(1000);
+    const double used = TestSupport::processSeconds() - before;
+    QVERIFY2(used < 0.1, qPrintable(QString::number(used)));
     port.close();
     QCOMPARE(log->texts(), QStringList());
 }

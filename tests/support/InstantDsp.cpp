@@ -85,6 +85,7 @@ struct Record
     std::size_t count = 0;
     // The port's own thread asks for messages.
     std::atomic<std::size_t> fetches = 0;
+    std::atomic<Uint32> fetchTimeout = 0;
     std::atomic<const char*> refused = "";
     const char* eventful = "";
     void (*happens)() = nullptr;
@@ -140,6 +141,11 @@ QStringList TestSupport::InstantDsp::takeCalls()
         all.append(QString::fromLatin1(record.calls[index].data()));
     record.count = 0;
     return all;
+}
+
+std::uint32_t TestSupport::InstantDsp::fetchTimeout()
+{
+    return record.fetchTimeout;
 }
 
 std::size_t TestSupport::InstantDsp::fetches()
@@ -276,6 +282,7 @@ DSP_STATUS MSGQ_put(MSGQ_Queue /*msgqQueue*/, MSGQ_Msg msg)
 
 DSP_STATUS MSGQ_get(MSGQ_Queue /*msgqQueue*/, Uint32 timeout, MSGQ_Msg* msg)
 {
+    record.fetchTimeout = timeout;
     ++record.fetches;
     if (isRefused("MSGQ_get"))
         return static_cast<DSP_STATUS>(TestSupport::InstantDsp::refusal);

@@ -15,7 +15,8 @@
 /// It keeps the calls that open and close the link, with their arguments: "PROC_attach(0, null)"; numbers of 32 bits in
 /// hexadecimal, a pool's attributes as "4: 10 x 2048, ... exact".
 ///
-/// Threads: `deliver` and `fetches` may be called from any, the others from the one that opens and closes.
+/// Threads: `deliver`, `fetches` and `fetchTimeout` may be called from any, the others from the one that opens and
+/// closes.
 namespace TestSupport::InstantDsp
 {
 
@@ -28,6 +29,8 @@ void deliver(const QByteArray& data, std::uint16_t id = 100);
 
 /// How often the program has asked for a message.
 [[nodiscard]] std::size_t fetches();
+/// How long the last of these wanted to wait, in milliseconds.
+[[nodiscard]] std::uint32_t fetchTimeout();
 
 /// What happens during this call, one that is kept, from now on; no name: nothing. The name must last.
 void during(const char* call = "", void (*happens)() = nullptr);

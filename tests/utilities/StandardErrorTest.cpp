@@ -247,7 +247,25 @@ private slots:
         auto* const previous = qInstallMessageHandler(nullptr);
         StandardError::keepFromBlocking();
         qDebug("nobody is there");
+        const ErrorPipe next;
+        qDebug("somebody is there");
+        next.restore();
         qInstallMessageHandler(previous);
+        QCOMPARE(next.take(), QByteArray("somebody is there\n"));
+    }
+
+    /// A pipe takes 64 KiB at once.
+    void aLineLongerThanAPipeArrivesWhole()
+    {
+        const ErrorPipe pipe;
+        auto* const previous = qInstallMessageHandler(nullptr);
+        StandardError::keepFromBlocking();
+        const QByteArray line(300'000, 'x');
+        qDebug("%s", line.constData());
+        qInstallMessageHandler(previous);
+        QByteArray read;
+        QTRY_COMPARE_WITH_TIMEOUT((read += pipe.take()).size(), line.size() + 1, 20'000);
+        QVERIFY(read == line + '\n');
     }
 
     void aFatalMessageIsWrittenBeforeTheProcessEnds()
