@@ -71,6 +71,9 @@ private slots:
             QVERIFY(peer->sendMessage(message(dataType, 40)));
         arrived(3);
         QCOMPARE(port->bytesAvailable(), 40);
+        // What the base class has been given back counts, too.
+        port->ungetChar('x');
+        QCOMPARE(port->bytesAvailable(), 41);
     }
 
     void readingWithNothingThereIsLogged()

@@ -60,6 +60,7 @@ private slots:
     void readyReadComesOncePerChunkOfAtMost46Bytes();
     void theLineIsReadOnAThreadOfHighPriority();
     void readDataGivesAtMostWhatIsAskedFor();
+    void bytesAvailableIsAllThatCanBeRead();
     void aLineFeedAnywhereMakesALineReadable();
     void writtenBytesReachTheLineAtOnce();
     void aPartlyAcceptedWriteReportsTheFullLength();
@@ -140,6 +141,18 @@ void SerialPortTest::everyByteArrivesInOrder()
     peer.join();
     QVERIFY(complete);
     QCOMPARE(received, sent);
+}
+
+void SerialPortTest::bytesAvailableIsAllThatCanBeRead()
+{
+    const Pty pty;
+    OpenedPort port(pty);
+    QCOMPARE(port.bytesAvailable(), 0);
+    pty.write(numberedBytes(100));
+    QTRY_COMPARE(port.bytesAvailable(), 100);
+    // What the base class has been given back counts, too.
+    port.ungetChar('x');
+    QCOMPARE(port.bytesAvailable(), 101);
 }
 
 void SerialPortTest::readyReadComesOncePerChunkOfAtMost46Bytes()

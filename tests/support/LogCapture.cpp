@@ -23,6 +23,8 @@ namespace
 {
 
 constexpr const char* logPath = "/dev/log";
+/// More messages than the kernel keeps for a socket: who takes so many has all that had come, however many more come.
+constexpr int longestQueue = 1024;
 
 /// "<PRI>Mmm dd hh:mm:ss IDENTITY: TEXT"
 LogLine parsed(const QByteArray& datagram)
@@ -67,13 +69,20 @@ LogCapture::~LogCapture()
 
 void LogCapture::receive()
 {
-    std::array<char, 65536> buffer{};
     std::array<pollfd, 2> waits{pollfd{socket, POLLIN, 0}, pollfd{wakeUp[0], POLLIN, 0}};
     while (::poll(waits.data(), waits.size(), -1) > 0 && waits[1].revents == 0) {
-        const auto length = ::recv(socket, buffer.data(), buffer.size(), 0);
-        if (length <= 0)
-            continue;
         const std::lock_guard lock(mutex);
+        takeAll();
+    }
+}
+
+void LogCapture::takeAll() const
+{
+    std::array<char, 65536> buffer; // NOLINT(cppcoreguidelines-pro-type-member-init): written by recv
+    for (int taken = 0; taken < longestQueue; ++taken) {
+        const auto length = ::recv(socket, buffer.data(), buffer.size(), MSG_DONTWAIT);
+        if (length <= 0)
+            return;
         received.push_back(parsed(QByteArray(buffer.data(), length)));
     }
 }
@@ -81,6 +90,7 @@ void LogCapture::receive()
 std::vector<LogLine> LogCapture::lines() const
 {
     const std::lock_guard lock(mutex);
+    takeAll();
     return received;
 }
 
@@ -107,6 +117,7 @@ bool LogCapture::waitFor(const QString& ending, int expected, std::chrono::milli
 void LogCapture::clear()
 {
     const std::lock_guard lock(mutex);
+    takeAll();
     received.clear();
 }
 

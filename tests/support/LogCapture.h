@@ -35,7 +35,8 @@ public:
     LogCapture(const LogCapture&) = delete;
     LogCapture& operator=(const LogCapture&) = delete;
 
-    /// All messages so far, or those whose text ends in `ending` ("FILE, LINE, TEXT" lines included).
+    /// All messages that have been handed over so far, or those whose text ends in `ending` ("FILE, LINE, TEXT" lines
+    /// included).
     [[nodiscard]] std::vector<LogLine> lines() const;
     [[nodiscard]] QStringList texts() const;
     [[nodiscard]] int count(const QString& ending) const;
@@ -47,11 +48,13 @@ public:
 
 private:
     void receive();
+    /// What waits in the socket; under the mutex.
+    void takeAll() const;
 
     int socket = -1;
     int wakeUp[2] = {-1, -1};
     mutable std::mutex mutex;
-    std::vector<LogLine> received;
+    mutable std::vector<LogLine> received;
     std::thread thread;
 };
 
