@@ -5,11 +5,11 @@
 
 #include "tests/presentation/RfPanel.h"
 
+#include <QApplication>
+#include <QProcess>
 #include <QTest>
 
 #include <sys/resource.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include <csignal>
 
@@ -47,6 +47,22 @@ private:
     rlimit before{};
 };
 
+const QString restoringArgument = QStringLiteral("--restore-the-handler");
+
+/// What a program with a library that restores the handler comes to.
+int endedByTwoSignals()
+{
+    const TerminationSignals signalsOfTheProgram;
+    struct sigaction saved
+    {
+    };
+    sigaction(SIGTERM, nullptr, &saved);
+    std::raise(SIGTERM);
+    sigaction(SIGTERM, &saved, nullptr);
+    std::raise(SIGTERM);
+    return 0;
+}
+
 } // namespace
 
 /// What a termination signal does to a program that waits.
@@ -77,22 +93,11 @@ private slots:
     /// As after a library's call that has saved the actions before the first signal and restores them after it.
     void theSecondSignalKillsAlsoWhereTheHandlerIsBack()
     {
-        const TerminationSignals signalsOfTheProgram;
-        struct sigaction saved
-        {
-        };
-        sigaction(SIGTERM, nullptr, &saved);
-        const pid_t program = ::fork();
-        if (program == 0) {
-            std::raise(SIGTERM);
-            sigaction(SIGTERM, &saved, nullptr);
-            std::raise(SIGTERM);
-            ::_exit(0);
-        }
-        int status = 0;
-        QCOMPARE(::waitpid(program, &status, 0), program);
-        QVERIFY(WIFSIGNALED(status));
-        QCOMPARE(WTERMSIG(status), SIGTERM);
+        QProcess program;
+        program.start(QCoreApplication::applicationFilePath(), {restoringArgument});
+        QVERIFY(program.waitForFinished(60'000));
+        QCOMPARE(program.exitStatus(), QProcess::CrashExit);
+        QCOMPARE(program.exitCode(), SIGTERM);
     }
 
     void withoutAPipeTheFirstSignalKills()
@@ -132,5 +137,13 @@ private slots:
     }
 };
 
-QTEST_MAIN(TerminationSignalsTest)
+int main(int argc, char** argv)
+{
+    const QApplication application(argc, argv);
+    if (QCoreApplication::arguments().contains(restoringArgument))
+        return endedByTwoSignals();
+    TerminationSignalsTest test;
+    return QTest::qExec(&test, argc, argv);
+}
+
 #include "TerminationSignalsTest.moc"
