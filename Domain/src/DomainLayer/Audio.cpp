@@ -12,6 +12,7 @@
 
 #include <QFile>
 #include <QThread>
+#include <QtCore/qtsan_impl.h>
 
 #include <SDL.h>
 #include <alsa/asoundlib.h>
@@ -176,8 +177,12 @@ void Audio::PrivateData::startSound(LoadedSound sound, const QIODevice* device, 
 Audio::Audio(AbstractConfigurationData& configuration) : d(std::make_unique<PrivateData>(configuration))
 {
     d->openDevice();
-    moveToThread(&d->thread);
-    d->thread.start();
+    QThread& thread = d->thread;
+    moveToThread(&thread);
+    // The sanitizer cannot see into QThread::wait().
+    connect(
+        &thread, &QThread::finished, &thread, [&thread] { QtTsan::futexRelease(&thread); }, Qt::DirectConnection);
+    thread.start();
     d->setDeviceVolume(Audio::volume());
     connect(this, &Audio::audioSet, this, &Audio::playAudio);
 }
@@ -188,6 +193,7 @@ Audio::~Audio()
     disconnect(this, &Audio::audioSet, this, &Audio::playAudio);
     d->thread.quit();
     d->thread.wait();
+    QtTsan::futexAcquire(&d->thread);
     Audio::stop();
     if (closeDevice(d->feed) && d->initialised)
         SDL_Quit();
