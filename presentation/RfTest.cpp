@@ -74,10 +74,8 @@ struct RfTest::PrivateData
     {
     }
 
-    // A full line keeps a command's writer for half a second, and the DSP's commands wait up to 0.8 s for their answer:
-    // a program that is to end gives none.
-
     /// Sends a command and takes note of its result: a refused one leaves the pending flag set with nobody to clear it.
+    /// A program that is to end sends none: a full line would keep it for half a second.
     template <typename... Parameters, typename... Arguments>
     void send(bool (AbstractBeaconProcessor::*command)(Parameters...), Arguments... arguments)
     {
@@ -98,6 +96,7 @@ struct RfTest::PrivateData
         wait();
     }
 
+    /// Nor does it ask the DSP, whose answer may take 0.8 s.
     void send(bool (Domain::AbstractDsp::*command)(qint32), qint32 argument)
     {
         if (!TerminationSignals::isEndRequested())

@@ -1,6 +1,8 @@
 // SPDX-FileCopyrightText: 2026 The ImmunityRig developers
 // SPDX-License-Identifier: MIT
 
+#include "tests/support/ThreadShortage.h"
+
 #include "Domain/src/DomainLayer/DspPort.h"
 #include "tests/Domain/DspTestParts.h"
 #include "tests/Domain/Radio.h"
@@ -9,38 +11,13 @@
 #include <QTest>
 #include <QThread>
 
-#include <dlfcn.h>
-#include <pthread.h>
-
-#include <atomic>
-#include <cerrno>
 #include <memory>
 
 using TestSupport::DspPeer;
 using TestSupport::LogCapture;
 using TestSupport::Radio;
 using TestSupport::sourcedTexts;
-
-namespace
-{
-
-/// How many of the next threads the system refuses.
-std::atomic<int> refusals = 0;
-
-} // namespace
-
-/// Qt's threads are the ones with attributes; those of the tests' own parts are started.
-extern "C" int pthread_create(pthread_t* thread, const pthread_attr_t* attributes, void* (*start)(void*),
-                              void* argument)
-{
-    using Function = int (*)(pthread_t*, const pthread_attr_t*, void* (*)(void*), void*);
-    static const auto real = reinterpret_cast<Function>(::dlsym(RTLD_NEXT, "pthread_create"));
-    if (attributes != nullptr && refusals > 0) {
-        --refusals;
-        return EAGAIN;
-    }
-    return real(thread, attributes, start, argument);
-}
+using TestSupport::ThreadShortage::refusesOfQt;
 
 /// The links on a machine that has no thread left for them. Neither may hold up the start for ever.
 class ThreadShortageTest : public QObject
@@ -69,9 +46,9 @@ void ThreadShortageTest::dspPortWithoutItsReadThreadIsRefusedAndCanBeClosed()
 {
     const DspPeer peer;
     Domain::DspPort port(QStringLiteral("/dsp.out"));
-    refusals = 1;
+    refusesOfQt = 1;
     QVERIFY(!port.open(QIODevice::ReadWrite));
-    QCOMPARE(refusals.load(), 0);
+    QCOMPARE(refusesOfQt.load(), 0);
     QCOMPARE(sourcedTexts(*log), (QStringList{"DspLink: DSP execution started successfully.",
                                               "DspPort: Previous read thread is not finished."}));
     port.close();
@@ -80,9 +57,9 @@ void ThreadShortageTest::dspPortWithoutItsReadThreadIsRefusedAndCanBeClosed()
 
 void ThreadShortageTest::beaconProcessorWithoutItsThreadRefusesCommandsAndHearsTheRadio()
 {
-    refusals = 1;
+    refusesOfQt = 1;
     Radio radio;
-    QCOMPARE(refusals.load(), 0);
+    QCOMPARE(refusesOfQt.load(), 0);
     QCOMPARE(radio.processor.thread(), QThread::currentThread());
     QVERIFY(sourcedTexts(*log).contains(
         QStringLiteral("BeaconProcessor: No thread for the radio's answers: every command is refused")));

@@ -13,5 +13,5 @@ immunityrig_test(BeaconEngineTest SOURCES Domain/BeaconEngineTest.cpp Domain/Fra
   Domain/RadioPeer.cpp LIBRARIES Domain LABELS unit)
 immunityrig_test(BeaconTimeOutTest SOURCES Domain/BeaconTimeOutTest.cpp Domain/Frames.cpp Domain/Pty.cpp
   Domain/RadioPeer.cpp LIBRARIES Domain LABELS unit)
-immunityrig_test(ThreadShortageTest SOURCES Domain/ThreadShortageTest.cpp Domain/Frames.cpp Domain/Pty.cpp
-  Domain/RadioPeer.cpp LIBRARIES Domain DspLink ${CMAKE_DL_LIBS} LABELS unit)
+immunityrig_test(ThreadShortageTest SOURCES Domain/ThreadShortageTest.cpp support/ThreadShortage.cpp Domain/Frames.cpp
+  Domain/Pty.cpp Domain/RadioPeer.cpp LIBRARIES Domain DspLink ${CMAKE_DL_LIBS} LABELS unit)

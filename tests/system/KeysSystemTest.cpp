@@ -95,10 +95,7 @@ void KeysSystemTest::keyLightsItsLabelWhileHeld()
 {
     QFETCH(const QString, key);
     QFETCH(const QString, region);
-    REQUIRE(device.press(key));
-    REQUIRE(device.waitRegion(region, "green"));
-    REQUIRE(device.release(key));
-    REQUIRE(device.waitRegion(region, "white"));
+    REQUIRE(device.strike(key, region));
 }
 
 /// With a silent radio and a silent DSP the antenna key holds the program for some fifteen seconds, which end with the

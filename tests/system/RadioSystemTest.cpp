@@ -56,7 +56,6 @@ private:
     bool listen();
     void note(const QString& control, const QJsonValue& value);
     bool becomes(const QStringList& expected);
-    bool answers(const char* key, const char* region);
 
     DeviceUnderTest device;
     ControlClient listener;
@@ -90,12 +89,6 @@ void RadioSystemTest::note(const QString& control, const QJsonValue& value)
 bool RadioSystemTest::becomes(const QStringList& expected)
 {
     return QTest::qWaitFor([&] { return told == expected; }, limitMs);
-}
-
-bool RadioSystemTest::answers(const char* key, const char* region)
-{
-    return device.press(key) && device.waitRegion(region, "green") && device.release(key) &&
-           device.waitRegion(region, "white");
 }
 
 /// Acknowledged late, the first command is still the last one when the listener comes.
@@ -167,7 +160,7 @@ void RadioSystemTest::unpluggedLineTurnsTheBeaconRedUntilItIsBack()
 {
     REQUIRE(device.set("radio.line", "unplugged"));
     REQUIRE(device.waitRegion("rf.beacon", "red"));
-    REQUIRE(answers("F12", "key.power"));
+    REQUIRE(device.strike("F12", "key.power"));
     REQUIRE(device.set("radio.line", "connected"));
     REQUIRE(device.waitRegion("rf.beacon", "green"));
 }
@@ -178,7 +171,7 @@ void RadioSystemTest::lineThatHangsUpTurnsTheBeaconRedAndEveryKeyAnswers()
     REQUIRE(device.set("radio.line", "hung-up"));
     REQUIRE(device.waitRegion("rf.beacon", "red"));
     for (const auto& [key, region] : keys)
-        REQUIRE(answers(key, region));
+        REQUIRE(device.strike(key, region));
     QCOMPARE(device.regionColour("rf.beacon"), QStringLiteral("red"));
 }
 

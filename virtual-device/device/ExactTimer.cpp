@@ -5,8 +5,6 @@
 
 #include "utilities/Debug.h"
 
-#include <QSocketNotifier>
-
 #include <sys/timerfd.h>
 #include <unistd.h>
 
@@ -19,19 +17,22 @@ namespace VirtualDevice
 using namespace std::chrono_literals;
 
 ExactTimer::ExactTimer(QObject* parent)
-    : QObject(parent), descriptor(::timerfd_create(CLOCK_MONOTONIC, TFD_NONBLOCK | TFD_CLOEXEC))
+    : QObject(parent),
+      descriptor(::timerfd_create(CLOCK_MONOTONIC, TFD_NONBLOCK | TFD_CLOEXEC)),
+      notifier(QSocketNotifier::Read, this)
 {
     if (descriptor < 0) {
         Utilities::Debug::warningMessage(QStringLiteral(__FILE__), __LINE__, QStringLiteral("Cannot make a timer: %m"));
         return;
     }
-    notifier = std::make_unique<QSocketNotifier>(descriptor, QSocketNotifier::Read, this);
-    connect(notifier.get(), &QSocketNotifier::activated, this, &ExactTimer::serve);
+    notifier.setSocket(descriptor);
+    notifier.setEnabled(true);
+    connect(&notifier, &QSocketNotifier::activated, this, &ExactTimer::serve);
 }
 
 ExactTimer::~ExactTimer()
 {
-    notifier.reset();
+    notifier.setEnabled(false);
     if (descriptor >= 0)
         ::close(descriptor);
 }

@@ -4,11 +4,9 @@
 #pragma once
 
 #include <QObject>
+#include <QSocketNotifier>
 
 #include <chrono>
-#include <memory>
-
-class QSocketNotifier;
 
 namespace VirtualDevice
 {
@@ -16,7 +14,7 @@ namespace VirtualDevice
 /// A single-shot timer in nanoseconds: on a line at 115200 baud a frame takes a fraction of the millisecond that QTimer
 /// counts in. Never early; late by what the kernel and the event loop need.
 ///
-/// Lives in the thread of its owner, which must run an event loop. Without a descriptor for it (logged once) it never
+/// Lives in the thread of its owner, which must run an event loop. Without a descriptor for it (logged) it never
 /// times out.
 class ExactTimer : public QObject
 {
@@ -39,7 +37,7 @@ private:
 
     int descriptor;
     bool active = false;
-    std::unique_ptr<QSocketNotifier> notifier;
+    QSocketNotifier notifier;
 };
 
 } // namespace VirtualDevice

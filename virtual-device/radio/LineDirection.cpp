@@ -98,11 +98,13 @@ void LineDirection::arm()
 {
     const QString manner = registry.text(control(".delivery"));
     std::chrono::nanoseconds wait = queue.size() * byteTime - (Clock::now() - lineTime);
-    if (manner == u"merge")
+    if (manner == u"split")
+        wait = splitWait;
+    else if (manner == u"merge")
         wait = std::max<std::chrono::nanoseconds>(wait, mergeHold);
     else
         wait = std::clamp<std::chrono::nanoseconds>(wait, byteTime, longestWait);
-    releaseTimer.start(manner == u"split" ? splitWait : wait);
+    releaseTimer.start(wait);
 }
 
 void LineDirection::release()

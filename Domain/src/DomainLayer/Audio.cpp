@@ -7,12 +7,11 @@
 #include "Domain/src/DomainLayer/AudioFeed.h"
 #include "Domain/src/DomainLayer/LoadedSound.h"
 #include "Domain/src/DomainLayer/PlayRequests.h"
+#include "Domain/src/DomainLayer/WorkerThread.h"
 #include "utilities/Debug.h"
 #include "utilities/SourceWarnings.h"
 
 #include <QFile>
-#include <QThread>
-#include <QtCore/qtsan_impl.h>
 
 #include <SDL.h>
 #include <alsa/asoundlib.h>
@@ -116,7 +115,7 @@ public:
     /// How often the sound has been stopped; raised under the mutex.
     std::atomic<unsigned int> stops = 0;
     PlayRequests requests;
-    QThread thread;
+    WorkerThread thread;
 };
 
 void Audio::PrivateData::openDevice()
@@ -177,12 +176,8 @@ void Audio::PrivateData::startSound(LoadedSound sound, const QIODevice* device, 
 Audio::Audio(AbstractConfigurationData& configuration) : d(std::make_unique<PrivateData>(configuration))
 {
     d->openDevice();
-    QThread& thread = d->thread;
-    moveToThread(&thread);
-    // The sanitizer cannot see into QThread::wait().
-    connect(
-        &thread, &QThread::finished, &thread, [&thread] { QtTsan::futexRelease(&thread); }, Qt::DirectConnection);
-    thread.start();
+    moveToThread(&d->thread);
+    d->thread.start();
     d->setDeviceVolume(Audio::volume());
     connect(this, &Audio::audioSet, this, &Audio::playAudio);
 }
@@ -191,9 +186,7 @@ Audio::~Audio()
 {
     // The thread may be loading a sound; what it has not begun to load is dropped with its event loop.
     disconnect(this, &Audio::audioSet, this, &Audio::playAudio);
-    d->thread.quit();
-    d->thread.wait();
-    QtTsan::futexAcquire(&d->thread);
+    d->thread.end();
     Audio::stop();
     if (closeDevice(d->feed) && d->initialised)
         SDL_Quit();

@@ -5,6 +5,7 @@
 
 #include "Domain/src/DomainLayer/AbstractButtons.h"
 #include "Domain/src/DomainLayer/DspPort.h"
+#include "Domain/src/DomainLayer/WorkerThread.h"
 #include "utilities/Debug.h"
 #include "utilities/SourceWarnings.h"
 
@@ -12,7 +13,6 @@
 #include <QDeadlineTimer>
 #include <QMutex>
 #include <QMutexLocker>
-#include <QThread>
 #include <QWaitCondition>
 #include <QtEndian>
 
@@ -135,7 +135,7 @@ struct Dsp::PrivateData
     /// Written by the worker before it takes the mutex to wake the sender, who looks again under the mutex.
     std::atomic<int> response = NoResponse;
     QMutex sendMutex; ///< taken before responseMutex
-    QThread workerThread;
+    WorkerThread workerThread;
 };
 
 const std::array<Dsp::PrivateData::MessageKind, 11> Dsp::PrivateData::messageKinds{{
@@ -158,12 +158,8 @@ const std::array<Dsp::PrivateData::MessageKind, 11> Dsp::PrivateData::messageKin
 
 Dsp::Dsp(QIODevice& port, AbstractButtons& buttons) : privateData(std::make_unique<PrivateData>(this, port, buttons))
 {
-    QThread& worker = privateData->workerThread;
-    moveToThread(&worker);
-    // As with waitUnlocked(): the sanitizer cannot see into QThread::wait().
-    connect(
-        &worker, &QThread::finished, &worker, [&worker] { QtTsan::futexRelease(&worker); }, Qt::DirectConnection);
-    worker.start(QThread::HighestPriority);
+    moveToThread(&privateData->workerThread);
+    privateData->workerThread.start(QThread::HighestPriority);
     // Connected before the port opens: a message is announced once, and one unheard would leave every later one a
     // message late.
     connect(&port, &QIODevice::readyRead, this, &Dsp::receiveData);
@@ -177,9 +173,7 @@ Dsp::~Dsp()
     // The worker may be in the middle of a message: it ends before anything that it uses.
     disconnect(&privateData->port, nullptr, this, nullptr);
     disconnect(&privateData->buttons, nullptr, this, nullptr);
-    privateData->workerThread.quit();
-    privateData->workerThread.wait();
-    QtTsan::futexAcquire(&privateData->workerThread);
+    privateData->workerThread.end();
     privateData->port.close();
 }
 
