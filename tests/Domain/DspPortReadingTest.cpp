@@ -2,6 +2,7 @@
 // SPDX-License-Identifier: MIT
 
 #include "tests/Domain/DspPortFixture.h"
+#include "tests/support/WakeUpWatch.h"
 
 #include <QTest>
 
@@ -14,6 +15,7 @@ using TestSupport::dataType;
 using TestSupport::DspPeer;
 using TestSupport::nakType;
 using TestSupport::sourcedTexts;
+using TestSupport::WakeUpWatch;
 
 /// What the port makes of the DSP's messages, over the host library and a real socket.
 class DspPortReadingTest : public QObject, private TestSupport::DspPortFixture
@@ -33,6 +35,19 @@ private slots:
         for (const char fill : {'a', '\n', '\0'})
             QCOMPARE(next(), message(dataType, 40, fill));
         QVERIFY(announcer != QThread::currentThread());
+    }
+
+    void theReadThreadDoesNotEndUnderTheHandsThatWakeIt()
+    {
+        openPort();
+        QVERIFY(peer->sendMessage(message(dataType, 40)));
+        arrived(1);
+        port->close();
+        const WakeUpWatch watch(*announcer);
+        QVERIFY(port->open(QIODevice::ReadWrite));
+        port->close();
+        QVERIFY(watch.sawOnlyLivingThreadsWoken());
+        QCOMPARE(sourcedTexts(*log), TestSupport::openTexts);
     }
 
     void theLargestMessageIsOneRead()

@@ -5,6 +5,7 @@
 #include "tests/Domain/SerialLine.h"
 #include "tests/support/LogCapture.h"
 #include "tests/support/ProcessorTime.h"
+#include "tests/support/WakeUpWatch.h"
 #include "utilities/Debug.h"
 
 #include <QCoreApplication>
@@ -32,6 +33,7 @@ using TestSupport::Pty;
 using TestSupport::readAll;
 using TestSupport::ReadingThread;
 using TestSupport::waitFor;
+using TestSupport::WakeUpWatch;
 
 namespace
 {
@@ -103,6 +105,7 @@ private slots:
     void cleanup() { log.reset(); }
 
     void aLateReadThreadIsReportedAndRefusesTheNextOpen();
+    void theReadThreadDoesNotEndUnderTheHandsThatWakeIt();
     void pollPortOnAClosedPortIsReported();
     void aFailingSelectIsReportedAndReadingGoesOn();
     void interruptedWaitsAreInvisible();
@@ -137,6 +140,25 @@ void SerialPortTroubleTest::aLateReadThreadIsReportedAndRefusesTheNextOpen()
     QVERIFY(log->waitFor(", Previous read thread is not finished."));
     QCOMPARE(log->lines().size(), std::size_t(2));
     guest.released = true;
+}
+
+void SerialPortTroubleTest::theReadThreadDoesNotEndUnderTheHandsThatWakeIt()
+{
+    const Pty pty;
+    ClosedPort port(pty);
+    const ReadingThread reader(port);
+    QVERIFY(port.open(QIODevice::ReadWrite));
+    pty.write("x");
+    QVERIFY(waitFor([&] { return reader.chunks == 1; }));
+    port.close();
+    // Without a thread there is nothing to end, neither now nor when one comes.
+    QVERIFY(port.open(QIODevice::WriteOnly));
+    port.close();
+    const WakeUpWatch watch(*reader.object);
+    QVERIFY(port.open(QIODevice::ReadWrite));
+    port.close();
+    QVERIFY(watch.sawOnlyLivingThreadsWoken());
+    QVERIFY(log->lines().empty());
 }
 
 void SerialPortTroubleTest::pollPortOnAClosedPortIsReported()

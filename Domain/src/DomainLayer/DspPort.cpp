@@ -4,6 +4,7 @@
 #include "Domain/src/DomainLayer/DspPort.h"
 
 #include "Domain/src/DomainLayer/DspCommand.h"
+#include "Domain/src/DomainLayer/ReadThread.h"
 #include "utilities/Debug.h"
 
 #include <QCoreApplication>
@@ -12,7 +13,6 @@
 #include <QMutex>
 #include <QMutexLocker>
 #include <QSemaphore>
-#include <QThread>
 #include <QtEndian>
 
 #include <algorithm>
@@ -170,16 +170,14 @@ struct DspPort::PrivateData
     QList<QByteArray> receiveList;
     mutable QMutex lock; ///< receive list and full flag
     QSemaphore stopRequest;
-    QThread readThread;
+    ReadThread readThread;
 };
 
 DspPort::DspPort(const QString& dspExecutablePath, QObject* parent)
     : QIODevice(parent), privateData(std::make_unique<PrivateData>(this, dspExecutablePath))
 {
-    QThread& thread = privateData->readThread;
-    thread.moveToThread(&thread);
     // Direct: the loop runs where the signal is emitted, on the thread itself.
-    connect(&thread, SIGNAL(started()), this, SLOT(pollPort()), Qt::DirectConnection);
+    connect(&privateData->readThread, SIGNAL(started()), this, SLOT(pollPort()), Qt::DirectConnection);
 }
 
 DspPort::~DspPort()
@@ -253,8 +251,7 @@ bool DspPort::PrivateData::startReading()
     }
     keepRunning = true;
     readLoopFinished = false;
-    readThread.start(QThread::HighPriority);
-    if (readThread.isRunning())
+    if (readThread.begin())
         return true;
     // The machine has no thread left: nobody will ever end the loop.
     readLoopFinished = true;
@@ -276,7 +273,7 @@ void DspPort::PrivateData::stopReading()
     stopRequest.release();
     while (!readLoopFinished)
         QCoreApplication::processEvents(QEventLoop::ExcludeUserInputEvents);
-    if (!QMetaObject::invokeMethod(&readThread, "quit", Qt::QueuedConnection))
+    if (!readThread.queueQuit())
         Debug::warningMessage(__FILE__, __LINE__, QStringLiteral("Invoke of quit for read thread failed"));
     if (!readThread.wait(threadEndTimeout))
         Debug::warningMessage(__FILE__, __LINE__, QStringLiteral("Read thread took too long to finish"));

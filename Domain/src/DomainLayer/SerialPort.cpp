@@ -3,13 +3,13 @@
 
 #include "Domain/src/DomainLayer/SerialPort.h"
 
+#include "Domain/src/DomainLayer/ReadThread.h"
 #include "utilities/Debug.h"
 #include "utilities/SourceWarnings.h"
 
 #include <QByteArray>
 #include <QCoreApplication>
 #include <QFile>
-#include <QThread>
 
 #include <fcntl.h>
 #include <poll.h>
@@ -100,7 +100,6 @@ public:
     PrivateData(SerialPort& port, const QString& name, Baud speed)
         : owner(port), portName(name), deviceName(name), baud(speed)
     {
-        readThread.moveToThread(&readThread);
     }
 
     [[nodiscard]] bool openDevice(OpenMode mode);
@@ -126,7 +125,7 @@ public:
     QByteArray receiveBuffer;
     mutable std::mutex lock; ///< guards the receive buffer, and every change that somebody sleeps for
     std::condition_variable changed;
-    QThread readThread;
+    ReadThread readThread;
     FileDescriptor file;
     FileDescriptor stopEvent{::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC)};
 };
@@ -163,10 +162,10 @@ bool SerialPort::PrivateData::startReading()
     ::eventfd_read(stopEvent.get(), &stale);
     keepRunning = true;
     readLoopFinished = false;
-    readThread.start(QThread::HighPriority);
-    if (!readThread.isRunning())
-        finishReading();
-    return readThread.isRunning();
+    if (readThread.begin())
+        return true;
+    finishReading();
+    return false;
 }
 
 void SerialPort::PrivateData::requestStop()
@@ -320,7 +319,7 @@ void SerialPort::close()
         QCoreApplication::processEvents(QEventLoop::ExcludeUserInputEvents);
         data->waitForReadLoop();
     }
-    if (!QMetaObject::invokeMethod(&data->readThread, "quit", Qt::QueuedConnection))
+    if (!data->readThread.queueQuit())
         warn(__LINE__, QStringLiteral("Invoke of quit for read thread failed"));
     if (!data->readThread.wait(closePatienceMs))
         warn(__LINE__, QStringLiteral("Read thread took too long to finish"));
