@@ -6,6 +6,7 @@
 #include <QtGlobal>
 
 #include <algorithm>
+#include <optional>
 
 namespace TestSupport
 {
@@ -81,12 +82,42 @@ QList<QByteArray> randomPieces(Generator& generator, const QByteArray& bytes, in
 namespace
 {
 
+/// An event of each byte with the same probability. Draws how many bytes go by until the next, not every byte's fate:
+/// the streams have millions of them.
+class RareEvent
+{
+public:
+    RareEvent(Generator& source, double probability) : generator(source)
+    {
+        if (probability <= 0)
+            return;
+        bytesBetween.emplace(probability);
+        bytesLeft = (*bytesBetween)(generator);
+    }
+
+    bool happens()
+    {
+        if (!bytesBetween || bytesLeft-- > 0)
+            return false;
+        bytesLeft = (*bytesBetween)(generator);
+        return true;
+    }
+
+private:
+    Generator& generator;
+    std::optional<std::geometric_distribution<int>> bytesBetween; ///< empty: never
+    int bytesLeft = 0;
+};
+
 /// Decides for each byte how the line treats it.
 class BadLine
 {
 public:
     BadLine(Generator& source, const DamageRates& rates)
-        : generator(source), altered(rates.altered), dropped(rates.dropped), inserted(rates.inserted)
+        : generator(source),
+          altered(source, rates.altered),
+          dropped(source, rates.dropped),
+          inserted(source, rates.inserted)
     {
     }
 
@@ -94,13 +125,13 @@ public:
     bool transmit(char byte, QByteArray& received)
     {
         bool whole = true;
-        if (inserted(generator)) {
+        if (inserted.happens()) {
             received.append(static_cast<char>(generator()));
             whole = false;
         }
-        if (dropped(generator))
+        if (dropped.happens())
             return false;
-        if (altered(generator)) {
+        if (altered.happens()) {
             byte = static_cast<char>(byte ^ randomBetween(generator, 1, 255));
             whole = false;
         }
@@ -110,9 +141,9 @@ public:
 
 private:
     Generator& generator;
-    std::bernoulli_distribution altered;
-    std::bernoulli_distribution dropped;
-    std::bernoulli_distribution inserted;
+    RareEvent altered;
+    RareEvent dropped;
+    RareEvent inserted;
 };
 
 } // namespace
