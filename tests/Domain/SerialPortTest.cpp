@@ -63,6 +63,7 @@ private slots:
     void bytesAvailableIsAllThatCanBeRead();
     void aLineFeedAnywhereMakesALineReadable();
     void writtenBytesReachTheLineAtOnce();
+    void twoWhoWriteAtOnceBothSucceed();
     void aPartlyAcceptedWriteReportsTheFullLength();
     void aLineThatTakesNothingFailsTheWrite();
     void openWithoutReadAccessConfiguresTheLineAndReadsNothing();
@@ -224,6 +225,30 @@ void SerialPortTest::writtenBytesReachTheLineAtOnce()
     const QByteArray sent = numberedBytes(256);
     QCOMPARE(port.write(sent), qint64(256));
     QCOMPARE(pty.read(256), sent);
+}
+
+void SerialPortTest::twoWhoWriteAtOnceBothSucceed()
+{
+    constexpr int each = 20000;
+    const Pty pty;
+    OpenedPort port(pty);
+    std::atomic<int> failed = 0;
+    std::atomic<int> writing = 2;
+    const auto writer = [&] {
+        for (int number = 0; number < each; ++number)
+            failed += port.write("x") == 1 ? 0 : 1;
+        --writing;
+    };
+    std::thread one(writer);
+    std::thread other(writer);
+    QByteArray received;
+    while (writing > 0)
+        received += pty.read();
+    one.join();
+    other.join();
+    QCOMPARE(failed.load(), 0);
+    received += pty.read(2 * each - received.size());
+    QCOMPARE(received, QByteArray(2 * each, 'x'));
 }
 
 void SerialPortTest::aPartlyAcceptedWriteReportsTheFullLength()

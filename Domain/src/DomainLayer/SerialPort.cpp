@@ -114,7 +114,7 @@ public:
     void rest(milliseconds duration);
     void waitForRoom();
 
-    [[nodiscard]] ssize_t write(const char* bytes, std::size_t count) const;
+    [[nodiscard]] ssize_t write(const char* bytes, std::size_t count);
 
     SerialPort& owner;
     QString portName;
@@ -125,6 +125,7 @@ public:
     QByteArray receiveBuffer;
     mutable std::mutex lock; ///< guards the receive buffer, and every change that somebody sleeps for
     std::condition_variable changed;
+    std::mutex writing; ///< the driver turns away whoever comes while another one writes
     ReadThread readThread;
     FileDescriptor file;
     FileDescriptor stopEvent{::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC)};
@@ -243,8 +244,9 @@ void SerialPort::PrivateData::waitForRoom()
 }
 
 /// A driver that takes nothing for the whole patience fails the write; an interrupted call has written nothing.
-ssize_t SerialPort::PrivateData::write(const char* bytes, std::size_t count) const
+ssize_t SerialPort::PrivateData::write(const char* bytes, std::size_t count)
 {
+    const std::lock_guard guard(writing);
     const auto attempt = [&] {
         ssize_t written = 0;
         do
