@@ -105,6 +105,7 @@ private slots:
     void programThatRefusesToEndIsKilled();
     void programThatIsKilledTakesTheDeviceDown();
     void deviceThatGoesTakesItsProgramAlong();
+    void deviceThatHasEndedLeavesTheNextOneOfItsNameAlone();
     void devicesStandSideBySide();
     void portThatIsTakenIsReportedAndNothingIsLeft();
     void stateThatCannotBeMadeIsReportedAndNothingIsLeft();
@@ -402,6 +403,18 @@ void DeviceTest::deviceThatGoesTakesItsProgramAlong()
         QVERIFY(program > 0);
     }
     QVERIFY(!QFileInfo::exists(QStringLiteral("/proc/%1").arg(program)));
+}
+
+void DeviceTest::deviceThatHasEndedLeavesTheNextOneOfItsNameAlone()
+{
+    auto first = std::make_unique<Device>(shell(QStringLiteral("exit 0")));
+    QCOMPARE(statusOf(*first), 0);
+    const QString name = first->folder().name();
+    Device second(window());
+    QVERIFY(stands(second));
+    QCOMPARE(second.folder().name(), name);
+    first.reset();
+    QVERIFY(QFileInfo::exists(second.controlSocket()));
 }
 
 void DeviceTest::devicesStandSideBySide()

@@ -22,9 +22,14 @@ ControlServer::~ControlServer()
     close();
 }
 
-void ControlServer::close()
+void ControlServer::stopListening()
 {
     server.close();
+}
+
+void ControlServer::close()
+{
+    stopListening();
     qDeleteAll(findChildren<ControlSession*>(Qt::FindDirectChildrenOnly));
 }
 

@@ -49,6 +49,8 @@ public:
 
     /// Replaces a socket that an earlier device left at `path`. Returns what went wrong.
     [[nodiscard]] std::optional<QString> listen(const QString& path);
+    /// Removes the socket; whoever is there already stays.
+    void stopListening();
     /// Hangs up on every client and removes the socket.
     void close();
     [[nodiscard]] QString path() const { return server.fullServerName(); }

@@ -203,7 +203,8 @@ void Device::watchModels()
     connect(&dsp, &DspModel::violated, &monitor, [raise](const QString& what) { raise("dsp", what); });
 }
 
-/// In the opposite order: nobody may use a file system when it goes.
+/// In the opposite order: nobody may use a file system when it goes. When the name is free, nothing may stand in the
+/// folder that this device would still remove: it may be the next one's.
 void Device::tearDown()
 {
     sandbox.kill();
@@ -212,6 +213,7 @@ void Device::tearDown()
     logStore.close();
     dataPartition.unmount();
     deviceTree.unmount();
+    controlServer.stopListening();
     deviceFolder.release();
 }
 
