@@ -275,8 +275,9 @@ bool Connection::receivePackets()
 {
     // One packet a call: the caller looks at room, stop and output in between.
     const ssize_t length = ::recv(socket, received.data(), received.size(), MSG_DONTWAIT | MSG_TRUNC);
+    // A peer that goes with something unread is told of first; what it said before is still there.
     if (length < 0)
-        return errno == EAGAIN || errno == EINTR;
+        return errno == EAGAIN || errno == EINTR || errno == ECONNRESET;
     if (length == 0) // the end, or a packet of no bytes
         return !hungUp(socket);
     if (static_cast<std::size_t>(length) <= received.size())

@@ -122,7 +122,6 @@ void AudioPlaybackTest::playingEndsAfterTheLastByte()
     const QByteArray samples = noise(200 * SoundFixture::bufferSize, 7);
     audio->play(wave(samples));
     waitForTheStart();
-    QVERIFY(audio->isPlaying());
     // The driver has written a buffer before the device can be asked: all of them must be there once it says no.
     waitForTheEnd();
     audio.reset();
@@ -199,7 +198,7 @@ void AudioPlaybackTest::stopEmitsNothing()
 
 void AudioPlaybackTest::pauseAndResumeLoseNothing()
 {
-    const QByteArray samples = noise(400 * SoundFixture::bufferSize, 1);
+    const QByteArray samples = noise(1200 * SoundFixture::bufferSize, 1);
     audio->play(wave(samples));
     QTRY_VERIFY_WITH_TIMEOUT(!sound->sounds().isEmpty(), 20000);
     audio->pause();

@@ -299,11 +299,12 @@ private slots:
     {
         peer->onMessage({});
         QVERIFY(!dsp->requestVersion());
-        std::atomic<int> read = 0;
+        std::atomic<int> later = 0;
         connect(
-            dsp.get(), &Dsp::messageReadStart, this, [&] { ++read; }, Qt::DirectConnection);
+            dsp.get(), &Dsp::lineNoiseDetected, this, [&] { ++later; }, Qt::DirectConnection);
         QVERIFY(peer->sendDsp(ack, DspPeer::words({0})));
-        QTRY_COMPARE(read.load(), 1);
+        QVERIFY(peer->sendDsp(0x11006, QByteArray(1, '\1')));
+        QTRY_COMPARE_WITH_TIMEOUT(later.load(), 1, 20'000);
         QVERIFY(!dsp->requestVersion());
         QCOMPARE(sourcedTexts(*log),
                  (QStringList{"Dsp: Timed out waiting for DSP ACK", "Dsp: Timed out waiting for DSP ACK"}));

@@ -56,11 +56,11 @@ public:
         return settled;
     }
 
+    QStringList events; ///< first: the port's end serves what is still queued
     Pty pty;
     Domain::SerialPort port;
     Domain::BeaconProcessor processor;
     RadioPeer peer;
-    QStringList events;
 
 private:
     void record()

@@ -127,6 +127,7 @@ private slots:
             held.push_back(message);
         }
         QVERIFY(peer->sendMessage(QByteArray(2028, 'x')));
+        QVERIFY(everythingSentHasArrived());
         MSGQ_Msg message = nullptr;
         QCOMPARE(bits(MSGQ_get(hostQueue, 200, &message)), 0x8000800CU);
         auto result = std::async(std::launch::async, [this] { return fetched(); });
@@ -450,7 +451,9 @@ private slots:
         QTRY_COMPARE(bits(put("closed")), 0x80008008U);
         QTRY_VERIFY(canAllocate());
         peer->setReading(true);
-        QCOMPARE(closing.get(), 0x800DU);
+        // The peer has little time to find the request behind all that it has not read.
+        const auto result = closing.get();
+        QVERIFY2(result == 0x800DU || result == 0x80008017U, qPrintable(QString::number(result, 16)));
     }
 
     void nothingIsLostWhenNobodyFetchesForAWhile()

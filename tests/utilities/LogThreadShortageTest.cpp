@@ -66,6 +66,7 @@ private slots:
         const TestSupport::LogCapture log;
         Debug::info(QStringLiteral("first"));
         Debug::debugBrief(QStringLiteral("second"));
+        QVERIFY(log.waitFor(QStringLiteral("second")));
         QCOMPARE(log.texts(), (QStringList{QStringLiteral("first"), QStringLiteral("second")}));
     }
 
