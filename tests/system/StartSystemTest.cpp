@@ -20,8 +20,8 @@ namespace
 {
 
 /// Before the program can begin its ten seconds, the virtual device, the sandbox and the relay are started: where
-/// sanitizers and compilers keep the machine busy that has taken ten more.
-constexpr auto startOfTheDevice = 10s;
+/// sanitizers and compilers keep the machine busy that has taken ten, and may take twenty more.
+constexpr auto startOfTheDevice = 20s;
 constexpr auto usualStart = startOfTheDevice + 10s;
 /// Where every command to a silent device ends by its time-out before the window stands.
 constexpr auto slowStart = 60s;

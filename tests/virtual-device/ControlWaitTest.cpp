@@ -141,7 +141,7 @@ void ControlWaitTest::waitThatDoesNotComeTrueSaysWhatThereIs()
     QElapsedTimer clock;
     clock.start();
     const auto reply = client->call("wait", {{"control", control}, {"value", 1}, {"within", 0.2}});
-    QVERIFY(clock.elapsed() >= 190);
+    QVERIFY(clock.elapsed() >= 180); // its timer is a coarse one
     QCOMPARE(reply.code, -32000);
     QCOMPARE(reply.message, "did not come true within 0.2 s");
     QCOMPARE(reply.data, QJsonValue(4100000));

@@ -471,7 +471,7 @@ void DeviceTreeTest::clockStandsStillWhenStopped()
     QCOMPARE(second.tm_sec, first.tm_sec);
     QCOMPARE(first.tm_sec, 40);
     set("rtc.running", true);
-    QVERIFY(QTest::qWaitFor([&] { return readClock(second) == 0 && second.tm_sec == 42; }, 20000));
+    QVERIFY(QTest::qWaitFor([&] { return readClock(second) == 0 && second.tm_sec >= 42; }, 20000));
 }
 
 void DeviceTreeTest::clockStartsAtTheHostsTime()

@@ -235,7 +235,8 @@ private slots:
         set("radio.line", "unplugged");
         command("6401");
         set("radio.text", "lost");
-        QTest::qWait(100);
+        for (int pass = 0; pass < 20; ++pass) // of the event loop, however long each takes
+            QTest::qWait(5);
         QCOMPARE(tty->everything(), QByteArray());
         QCOMPARE(number("radio.frames_good"), 0);
         set("radio.line", "connected");
