@@ -229,26 +229,22 @@ void SerialPortTest::writtenBytesReachTheLineAtOnce()
 
 void SerialPortTest::twoWhoWriteAtOnceBothSucceed()
 {
-    constexpr int each = 20000;
+    constexpr int each = 1000; // together less than the line takes without a reader
     const Pty pty;
     OpenedPort port(pty);
     std::atomic<int> failed = 0;
-    std::atomic<int> writing = 2;
     const auto writer = [&] {
         for (int number = 0; number < each; ++number)
             failed += port.write("x") == 1 ? 0 : 1;
-        --writing;
     };
-    std::thread one(writer);
-    std::thread other(writer);
-    QByteArray received;
-    while (writing > 0)
-        received += pty.read();
-    one.join();
-    other.join();
-    QCOMPARE(failed.load(), 0);
-    received += pty.read(2 * each - received.size());
-    QCOMPARE(received, QByteArray(2 * each, 'x'));
+    for (int round = 0; round < 50; ++round) { // the driver seldom finds two at once
+        std::thread one(writer);
+        std::thread other(writer);
+        one.join();
+        other.join();
+        QCOMPARE(failed.load(), 0);
+        QCOMPARE(pty.read(2 * each), QByteArray(2 * each, 'x'));
+    }
 }
 
 void SerialPortTest::aPartlyAcceptedWriteReportsTheFullLength()
