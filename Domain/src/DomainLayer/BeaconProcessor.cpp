@@ -11,6 +11,7 @@
 #include <QQueue>
 #include <QThread>
 #include <QTimer>
+#include <QtCore/qtsan_impl.h>
 #include <QtEndian>
 
 #include <algorithm>
@@ -318,6 +319,7 @@ BeaconProcessor::BeaconProcessor(SerialPort& serialPort) : data(std::make_unique
 /// A timer can be stopped on its own thread only, and nothing may be destroyed while that thread still uses it.
 BeaconProcessor::~BeaconProcessor()
 {
+    QtTsan::futexRelease(this); // the sanitizer cannot see into Qt's event queue
     QMetaObject::invokeMethod(this, "destroyObjectsOnThread", Qt::AutoConnection);
     data->objectsDestroyed.get_future().wait();
     data->workerThread.quit();
@@ -448,6 +450,7 @@ void BeaconProcessor::createObjectsOnThread()
 
 void BeaconProcessor::destroyObjectsOnThread()
 {
+    QtTsan::futexAcquire(this);
     data->protocol.reset();
     data->ackTimer.reset();
     data->objectsDestroyed.set_value();
